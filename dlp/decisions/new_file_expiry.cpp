@@ -1,0 +1,149 @@
+#include <dlp_sdk/expiry_after_table.h>
+#include <dlp_sdk/expiry_attribute.h>
+#include <dlp_sdk/file_open_tracking.h>
+#include <dlp_sdk/new_file_expiry.h>
+#include <dlp_sdk/process_name.h>
+
+#include <cerrno>
+#include <cstdint>
+#include <cstring>
+#include <ctime>
+
+#include "decisions/path_extension.h"
+#include "primitives/library_lock.h"
+#include "primitives/platform_log.h"
+#include "processmap/hash_map.h"
+
+namespace {
+
+// An expiry from now to now + 20 s was put there by this very file event; any other expiry was
+// set on purpose by the file manager and stays.
+constexpr uint64_t kFreshExpiryWindow = 21;
+constexpr long kInheritableAge = 599;
+
+bool isExpiryAlreadySet(const char* path, long now, const char* caseName,
+                        const char* alreadySetCaseName) {
+    long current = get_dlp_file_expiry_time(path);
+    long difference = current - now;
+    DLP_SYSTEM_DEBUG(
+            "DLP_LIBDLP : <setExpiryforFile> %s -- current time[%d], expiry_time[%d], time "
+            "diff[%d]",
+            caseName, static_cast<int>(now), static_cast<int>(current),
+            static_cast<int>(difference));
+    // Unsigned on purpose: an expiry already in the past counts as set as well.
+    if (current != -1 && static_cast<uint64_t>(difference) >= kFreshExpiryWindow) {
+        DLP_SYSTEM_DEBUG(
+                "DLP_LIBDLP : <setExpiryforFile> %s -- DLP expiry time is already set by Filbrook "
+                "ignoring the case",
+                alreadySetCaseName);
+        return true;
+    }
+    return false;
+}
+
+// 0, or the errno that the failed write left.
+int writeExpiry(const char* path, long expiry) {
+    int result = set_dlp_file_expiry_time(path, expiry);
+    if (result >= 0) return 0;
+    int error = errno != 0 ? errno : EIO;
+    DLP_SYSTEM_ERROR("DLP_LIBDLP : <setExpiryforFile> Error: setxattr(%s, setxattr error - %d, %d, %s\n",
+                     path, result, error, strerror(error));
+    return error;
+}
+
+int stampZipCopy(int pid, const char* path, long now) {
+    if (isExpiryAlreadySet(path, now, "support 2.7 Zip copy", "support for 2.7 zip")) return 0;
+    MapEntry last;
+    {
+        auto lock = dlp::lockLibraryState();
+        last = mProcessMap.getLastOpenedEntry(pid);
+    }
+    long expiry;
+    if (last.value_extension == "zip") {
+        DLP_SYSTEM_DEBUG(
+                "DLP_LIBDLP : <setExpiryforFile> support for 2.7 zip -- last opened entry is zip "
+                "inheriting");
+        expiry = last.value_expiry;
+    } else {
+        DLP_SYSTEM_DEBUG(
+                "DLP_LIBDLP : <setExpiryforFile> zip file created from Filbrook. Set End of day");
+        expiry = getEndOfDay();
+    }
+    // The attribute primitive reports its own failure; a zip copy always succeeds.
+    set_dlp_file_expiry_time(path, expiry);
+    return 0;
+}
+
+}  // namespace
+
+int setExpiryforFile(int pid, char* path, int containerId) {
+    if (path == nullptr) {
+        DLP_SYSTEM_ERROR("DLP_LIBDLP : <setExpiryforFile> file path is null. return -1");
+        return -1;
+    }
+    std::string extension = getExtensionFromPath(path);
+    long callTime = getCurrentTimeInSec();
+    if (extension == "zip" && getProcessNameByPid(pid) == FILE_MANAGER_PACKAGE) {
+        return stampZipCopy(pid, path, callTime);
+    }
+
+    long lookupTime = getCurrentTimeInSec();
+    MapEntry related;
+    bool inherits = false;
+    bool fileManagerCase = false;
+    {
+        auto lock = dlp::lockLibraryState();
+        related = mProcessMap.get(pid, extension);
+        if (related.value_pid == pid && related.value_expiry != -1) {
+            MapEntry candidate = related;
+            candidate.value_pid = pid;
+            inherits = !isNewFileCase(std::move(candidate), path, callTime, pid);
+            // Read after the classification, which may just have recorded the file manager.
+            fileManagerCase = mProcessMap.mFileManagerPid == pid ||
+                              related.value_extension == "unzip";
+        }
+    }
+
+    if (inherits) {
+        if (fileManagerCase && isExpiryAlreadySet(path, callTime, "Filbrook support case",
+                                                  "Filbrook support case")) {
+            return 0;
+        }
+        DLP_SYSTEM_DEBUG("DLP_LIBDLP : <setExpiryforFile> INHERITING CASE. expiry time[%d] for the file[%s]",
+                         static_cast<int>(related.value_expiry), path);
+        return writeExpiry(path, related.value_expiry);
+    }
+
+    long expiry = lookupTime + static_cast<long>(get_expiryAfter_time(containerId));
+    DLP_SYSTEM_DEBUG(
+            "DLP_LIBDLP : <setExpiryforFile> NEWFILE CASE. pid[%d], file_path[%s]. Set IT admin's "
+            "expiry[%ld]",
+            pid, path, expiry);
+    int result = writeExpiry(path, expiry);
+    if (result == 0) DLP_SYSTEM_DEBUG("DLP_LIBDLP : <setExpiryforFile> setxattr OK\n");
+    return result;
+}
+
+bool isNewFileCase(MapEntry entry, char* /*path*/, long currentTime, int pid) {
+    auto lock = dlp::lockLibraryState();
+    long openTime = entry.value_opentime;
+    if (mProcessMap.isRejectedPid(pid, std::move(entry))) {
+        DLP_SYSTEM_DEBUG(
+                "DLP_LIBDLP : <isNewFileCase> pid[%d] passed is in reject list do new file case",
+                pid);
+        return true;
+    }
+    return currentTime - openTime > kInheritableAge;
+}
+
+long getEndOfDay() {
+    time_t now = time(nullptr);
+    tm local{};
+    localtime_r(&now, &local);
+    local.tm_hour = 23;
+    local.tm_min = 59;
+    local.tm_sec = 59;
+    // Let mktime decide daylight saving for 23:59:59, which may differ from now's.
+    local.tm_isdst = -1;
+    return static_cast<long>(mktime(&local));
+}

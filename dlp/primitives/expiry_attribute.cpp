@@ -1,0 +1,79 @@
+#include <dlp_sdk/expiry_attribute.h>
+
+#include <sys/xattr.h>
+
+#include <cerrno>
+#include <cstdint>
+#include <cstring>
+
+#include "primitives/platform_log.h"
+
+namespace {
+
+constexpr const char* kExpiryAttribute = "user.zorvat_dlp";
+// Signed 64-bit little-endian expiry in bytes 0-7; bytes 8-15 are reserved and written as zero.
+constexpr size_t kExpiryValueSize = 16;
+
+void encodeExpiry(long expiry, unsigned char (&value)[kExpiryValueSize]) {
+    memset(value, 0, sizeof(value));
+    uint64_t bits = static_cast<uint64_t>(expiry);
+    for (size_t i = 0; i < 8; ++i) value[i] = static_cast<unsigned char>(bits >> (8 * i));
+}
+
+long decodeExpiry(const unsigned char (&value)[kExpiryValueSize]) {
+    uint64_t bits = 0;
+    for (size_t i = 0; i < 8; ++i) bits |= static_cast<uint64_t>(value[i]) << (8 * i);
+    return static_cast<long>(bits);
+}
+
+}  // namespace
+
+int set_dlp_file_expiry_time(const char* path, long expiry) {
+    if (path == nullptr) {
+        DLP_PRINT_ERROR("DLP_LIBDLP :  Error: setxattr(%s, setxattr error - %d, %d, %s\n", "(null)",
+                        -1, EINVAL, strerror(EINVAL));
+        errno = EINVAL;
+        return -1;
+    }
+    unsigned char value[kExpiryValueSize];
+    encodeExpiry(expiry, value);
+    int result = setxattr(path, kExpiryAttribute, value, sizeof(value), 0);
+    if (result == 0) {
+        DLP_PRINT_ERROR("DLP_LIBDLP :  set xattr is successful!!");
+        return 0;
+    }
+    int error = errno;
+    DLP_PRINT_ERROR("DLP_LIBDLP :  Error: setxattr(%s, setxattr error - %d, %d, %s\n", path, result,
+                    error, strerror(error));
+    return -1;
+}
+
+long get_dlp_file_expiry_time(const char* path) {
+    if (path == nullptr) {
+        DLP_PRINT_ERROR(
+                "DLP_LIBDLP :  in get_dlp_file_expiry_time Error: getxattr(%s, getxattr error - %d, "
+                "%d, %s\n",
+                "(null)", -1, EINVAL, strerror(EINVAL));
+        errno = EINVAL;
+        return -1;
+    }
+    unsigned char value[kExpiryValueSize];
+    int result = static_cast<int>(getxattr(path, kExpiryAttribute, value, sizeof(value)));
+    int error = errno;
+    if (result == -1 && error == ENODATA) {
+        DLP_PRINT_ERROR("DLP_LIBDLP :   in get_dlp_file_expiry_time normal file (%s)\n", path);
+        return -1;
+    }
+    if (result != static_cast<int>(kExpiryValueSize)) {
+        DLP_PRINT_ERROR(
+                "DLP_LIBDLP :  in get_dlp_file_expiry_time Error: getxattr(%s, getxattr error - %d, "
+                "%d, %s\n",
+                path, result, error, strerror(error));
+        return -1;
+    }
+    long expiry = decodeExpiry(value);
+    DLP_PRINT_ERROR("DLP_LIBDLP :  in get_dlp_file_expiry_time getxattr OK: [%ld]\n", expiry);
+    if (expiry > 0) return expiry;
+    DLP_PRINT_ERROR("DLP_LIBDLP :  dlp expiry time is <= 0 retunring -1");
+    return -1;
+}

@@ -1,0 +1,85 @@
+#include <algorithm>
+
+#include "primitives/library_lock.h"
+#include "primitives/platform_log.h"
+#include "processmap/hash_map.h"
+
+namespace {
+
+bool contains(const std::vector<std::string>& list, const std::string& extension) {
+    return std::find(list.begin(), list.end(), extension) != list.end();
+}
+
+}  // namespace
+
+int HashMap::isValidExtension(std::string extension) {
+    return contains(mDefaultExtensions, extension) || contains(mExtensionList, extension) ? 1 : 0;
+}
+
+int HashMap::addExtension(std::string extension) {
+    if (isValidExtension(extension) == 0) mExtensionList.push_back(std::move(extension));
+    return 1;
+}
+
+std::vector<std::string> getExtensions(const char* list, char delimiter) {
+    std::vector<std::string> tokens;
+    if (list == nullptr || *list == '\0') {
+        DLP_SYSTEM_ERROR("DLP_LIBDLP : <getExtensions> extention list is empty \n");
+        return tokens;
+    }
+    const char* start = list;
+    for (const char* cursor = list;; ++cursor) {
+        if (*cursor == delimiter || *cursor == '\0') {
+            tokens.emplace_back(start, cursor);
+            if (*cursor == '\0') return tokens;
+            start = cursor + 1;
+        }
+    }
+}
+
+void HashMap::makeExtensionGroups() {
+    auto lock = dlp::lockLibraryState();
+    // "xls" and "xlsx" relate to each other as "ppt" and "pptx" do.
+    const std::pair<const char*, std::vector<std::string>> rows[] = {
+            {"tmp", {"xlsx", "xls", "docx", "doc", "rtf", "txt", "ppt", "pptx"}},
+            {"xlsx", {"xls"}},
+            {"xls", {"xlsx"}},
+            {"doc", {"docx", "rtf", "txt"}},
+            {"docx", {"doc", "rtf", "txt"}},
+            {"rtf", {"doc", "docx", "txt"}},
+            {"txt", {"doc", "docx", "rtf"}},
+            {"ppt", {"pptx"}},
+            {"pptx", {"ppt"}},
+            {"htm", {"html"}},
+            {"html", {"htm"}},
+            {"jpg", {"jpeg", "png", "gif"}},
+            {"jpeg", {"jpg", "png", "gif"}},
+            {"png", {"jpeg", "jpg", "gif"}},
+            {"gif", {"jpeg", "jpg", "png"}},
+    };
+    for (const auto& row : rows) mExtensionGroups.emplace(row.first, row.second);
+}
+
+int HashMap::getValidMapEntryIndexForExt(std::string extension, std::vector<MapEntry> entries) {
+    auto lock = dlp::lockLibraryState();
+    auto group = mExtensionGroups.find(extension);
+    if (group == mExtensionGroups.end()) {
+        DLP_SYSTEM_ERROR(
+                "DLP_LIBDLP : <HashMap::getValidMapEntryIndexForExt> record with key[%s] not "
+                "found.",
+                extension.c_str());
+        return -2;
+    }
+    // The most recent entry of any related extension: the highest index that matches.
+    int result = -2;
+    for (const std::string& related : group->second) {
+        int lowest = result < 0 ? 0 : result + 1;
+        for (int index = static_cast<int>(entries.size()) - 1; index >= lowest; --index) {
+            if (entries[index].value_extension == related) {
+                result = index;
+                break;
+            }
+        }
+    }
+    return result;
+}

@@ -1,0 +1,181 @@
+#include <dlp_sdk/expiry_after_table.h>
+
+#include <fcntl.h>
+#include <sqlite3.h>
+#include <sys/stat.h>
+
+#include <array>
+#include <ctime>
+#include <memory>
+
+#include "primitives/library_lock.h"
+#include "primitives/platform_log.h"
+#include "primitives/unique_fd.h"
+
+namespace {
+
+constexpr const char* kDatabaseDirectory = "/data/system/users/dlp";
+constexpr const char* kDatabasePath = "/data/system/users/dlp/dlpinfo.db";
+constexpr const char* kCreateTable = "CREATE TABLE IF NOT EXISTS dlpInfo(Id INT, Time INT);";
+constexpr const char* kSelectDuration = "SELECT Id, Time FROM dlpInfo WHERE Id = ?";
+constexpr int kFirstId = 100;
+constexpr int kIdCount = 100;
+constexpr int kEmptySlot = -1;
+
+struct DatabaseCloser {
+    void operator()(sqlite3* database) const { sqlite3_close(database); }
+};
+struct StatementFinalizer {
+    void operator()(sqlite3_stmt* statement) const { sqlite3_finalize(statement); }
+};
+struct SqliteFree {
+    void operator()(char* text) const { sqlite3_free(text); }
+};
+using Database = std::unique_ptr<sqlite3, DatabaseCloser>;
+using Statement = std::unique_ptr<sqlite3_stmt, StatementFinalizer>;
+using SqliteText = std::unique_ptr<char, SqliteFree>;
+
+constexpr std::array<int, kIdCount> emptyCache() {
+    std::array<int, kIdCount> cache{};
+    for (int& slot : cache) slot = kEmptySlot;
+    return cache;
+}
+
+// Durations by id - 100; served without touching the database once filled.
+std::array<int, kIdCount> expiry_after_cache = emptyCache();
+
+bool isValidId(int id) { return id >= kFirstId && id < kFirstId + kIdCount; }
+
+// `label` names the caller as its messages do ("init_table:", "set_time :", "get_time :").
+Database openDatabase(const char* label) {
+    sqlite3* handle = nullptr;
+    int result = sqlite3_open(kDatabasePath, &handle);
+    Database database(handle);
+    if (result != SQLITE_OK) {
+        DLP_PRINT_ERROR("DLP_LIBEPM : %s Cannot open database: %s\n", label,
+                        handle ? sqlite3_errmsg(handle) : sqlite3_errstr(result));
+        return nullptr;
+    }
+    return database;
+}
+
+// The id's row, or a null statement (logged) when the query cannot be prepared.
+Statement selectDuration(sqlite3* database, int id, const char* label) {
+    sqlite3_stmt* handle = nullptr;
+    if (sqlite3_prepare_v2(database, kSelectDuration, -1, &handle, nullptr) != SQLITE_OK) {
+        DLP_PRINT_ERROR("DLP_LIBEPM : %s Failed to execute statement: %s\n", label,
+                        sqlite3_errmsg(database));
+        sqlite3_finalize(handle);
+        return nullptr;
+    }
+    Statement statement(handle);
+    sqlite3_bind_int(statement.get(), 1, id);
+    return statement;
+}
+
+// Runs `sql`; on failure hands back sqlite's error text.
+bool execute(sqlite3* database, const char* sql, SqliteText& error) {
+    char* message = nullptr;
+    int result = sqlite3_exec(database, sql, nullptr, nullptr, &message);
+    error.reset(message);
+    return result == SQLITE_OK;
+}
+
+}  // namespace
+
+int init_table() {
+    auto lock = dlp::lockLibraryState();
+    {
+        dlp::UniqueFd existing(open(kDatabasePath, O_RDONLY | O_CLOEXEC));
+        if (existing.ok()) return 0;
+    }
+    // May exist already; sqlite3_open reports anything that matters.
+    mkdir(kDatabaseDirectory, 0777);
+    Database database = openDatabase("init_table:");
+    if (!database) return 1;
+    SqliteText error;
+    if (!execute(database.get(), kCreateTable, error)) {
+        DLP_PRINT_ERROR("DLP_LIBEPM : init_table : SQL error: %s\n", error.get());
+        return 1;
+    }
+    return 0;
+}
+
+int set_time(int id, int time) {
+    auto lock = dlp::lockLibraryState();
+    if (!isValidId(id)) {
+        DLP_PRINT_ERROR("DLP_LIBEPM : set_time : set_time error : id : %d, index : %d\n", id,
+                        id - kFirstId);
+        return 1;
+    }
+    expiry_after_cache[id - kFirstId] = time;
+    if (init_table() == 1) return 1;
+    Database database = openDatabase("set_time :");
+    if (!database) return 1;
+    // A crash between creating the file and its table leaves a file without the table; without
+    // this, every later write would fail.
+    SqliteText ignored;
+    execute(database.get(), kCreateTable, ignored);
+
+    Statement select = selectDuration(database.get(), id, "set_time :");
+    SqliteText sql;
+    if (select && sqlite3_step(select.get()) == SQLITE_ROW) {
+        sql.reset(sqlite3_mprintf("Update dlpInfo Set Time = %d Where Id = %d", time, id));
+    } else {
+        DLP_PRINT_ERROR(
+                "DLP_LIBEPM : set_time : id : %d, It is not in the table. add time as %d\n", id,
+                time);
+        sql.reset(sqlite3_mprintf("INSERT INTO dlpInfo VALUES(%d, %d)", id, time));
+    }
+    SqliteText error;
+    if (!sql || !execute(database.get(), sql.get(), error)) {
+        DLP_PRINT_ERROR("DLP_LIBEPM : set_time : SQL error: %s\n",
+                        error ? error.get() : "out of memory");
+        return 1;
+    }
+    return 0;
+}
+
+int get_time(int id) {
+    auto lock = dlp::lockLibraryState();
+    if (!isValidId(id)) {
+        DLP_PRINT_ERROR("DLP_LIBEPM : get_time : error : id : %d, index : %d\n", id,
+                        id - kFirstId);
+        return -1;
+    }
+    int& slot = expiry_after_cache[id - kFirstId];
+    if (slot != kEmptySlot) return slot;
+    if (init_table() == 1) return -1;
+    Database database = openDatabase("get_time :");
+    if (!database) return -1;
+    Statement select = selectDuration(database.get(), id, "get_time :");
+    if (select && sqlite3_step(select.get()) == SQLITE_ROW) {
+        slot = sqlite3_column_int(select.get(), 1);
+        return slot;
+    }
+    DLP_PRINT_ERROR("DLP_LIBEPM : get_time : No id in the list\n");
+    return -1;
+}
+
+int set_expiryAfter_time(int id, int time) {
+    auto lock = dlp::lockLibraryState();
+    int result = set_time(id, time);
+    if (result != 0) DLP_PRINT_ERROR("DLP_LOG : set id : %d, time : %d is fail\n", id, time);
+    return result;
+}
+
+int get_expiryAfter_time(int id) {
+    auto lock = dlp::lockLibraryState();
+    int result = get_time(id);
+    if (result == -1) {
+        DLP_PRINT_ERROR("DLP_LOG : get id : %d is fail\n", id);
+        return 1;
+    }
+    return result;
+}
+
+long getITAdminExpiryTime(int id) {
+    auto lock = dlp::lockLibraryState();
+    long now = time(nullptr);
+    return now + static_cast<long>(get_expiryAfter_time(id));
+}

@@ -1,0 +1,13 @@
+#pragma once
+
+#include <dlp_sdk/export.h>
+
+extern "C" {
+
+// Writes `expiry` into the "user.zorvat_dlp" attribute of `path`. 0 on success, -1 on failure.
+DLP_EXPORT int set_dlp_file_expiry_time(const char* path, long expiry);
+
+// The expiry stored on `path` when it is greater than 0, else -1.
+DLP_EXPORT long get_dlp_file_expiry_time(const char* path);
+
+}  // extern "C"

@@ -1,0 +1,13 @@
+#pragma once
+
+#include <dlp_sdk/export.h>
+
+// Parks `pid` against `inode`; an inode already parked keeps its pid. False for inode 0 or a
+// negative pid.
+DLP_EXPORT bool putPendingInodeValue(unsigned long inode, int pid);
+
+// The parked pid, -1 when none, 0 for inode 0.
+DLP_EXPORT int getPidByInode(unsigned long inode);
+
+// Drops the pair of `inode`. False for inode 0 only.
+DLP_EXPORT bool clearPendingInode(unsigned long inode);
