@@ -46,8 +46,9 @@ int writeExpiry(const char* path, long expiry) {
     int result = set_dlp_file_expiry_time(path, expiry);
     if (result >= 0) return 0;
     int error = errno != 0 ? errno : EIO;
-    DLP_SYSTEM_ERROR("DLP_LIBDLP : <setExpiryforFile> Error: setxattr(%s, setxattr error - %d, %d, %s\n",
-                     path, result, error, strerror(error));
+    DLP_SYSTEM_ERROR(
+            "DLP_LIBDLP : <setExpiryforFile> Error: setxattr(%s, setxattr error - %d, %d, %s\n",
+            path, result, error, strerror(error));
     return error;
 }
 
@@ -99,18 +100,19 @@ int setExpiryforFile(int pid, char* path, int containerId) {
             candidate.value_pid = pid;
             inherits = !isNewFileCase(std::move(candidate), path, callTime, pid);
             // Read after the classification, which may just have recorded the file manager.
-            fileManagerCase = mProcessMap.mFileManagerPid == pid ||
-                              related.value_extension == "unzip";
+            fileManagerCase =
+                    mProcessMap.mFileManagerPid == pid || related.value_extension == "unzip";
         }
     }
 
     if (inherits) {
-        if (fileManagerCase && isExpiryAlreadySet(path, callTime, "Filbrook support case",
-                                                  "Filbrook support case")) {
+        if (fileManagerCase &&
+            isExpiryAlreadySet(path, callTime, "Filbrook support case", "Filbrook support case")) {
             return 0;
         }
-        DLP_SYSTEM_DEBUG("DLP_LIBDLP : <setExpiryforFile> INHERITING CASE. expiry time[%d] for the file[%s]",
-                         static_cast<int>(related.value_expiry), path);
+        DLP_SYSTEM_DEBUG(
+                "DLP_LIBDLP : <setExpiryforFile> INHERITING CASE. expiry time[%d] for the file[%s]",
+                static_cast<int>(related.value_expiry), path);
         return writeExpiry(path, related.value_expiry);
     }
 

@@ -9,7 +9,7 @@ namespace {
 
 // The characters of a Java string for the length of one library call.
 class Utf8Chars {
-public:
+  public:
     Utf8Chars(JNIEnv* env, jstring text)
         : env_(env), text_(text), chars_(text ? env->GetStringUTFChars(text, nullptr) : nullptr) {}
     ~Utf8Chars() {
@@ -20,7 +20,7 @@ public:
 
     const char* get() const { return chars_; }
 
-private:
+  private:
     JNIEnv* env_;
     jstring text_;
     const char* chars_;
@@ -32,34 +32,36 @@ extern "C" {
 
 DLP_EXPORT JNIEXPORT jlong JNICALL
 Java_com_halvorn_android_zorvat_dlp_XattrManager_Native_1Dlp_1GetDLPFileExpiryTime(JNIEnv* env,
-                                                                                  jobject,
-                                                                                  jstring path) {
+                                                                                   jobject,
+                                                                                   jstring path) {
     Utf8Chars chars(env, path);
     // A null string, or one the VM could not copy (it has then thrown OutOfMemoryError).
     if (chars.get() == nullptr) return -1;
     return static_cast<jlong>(get_dlp_file_expiry_time(chars.get()));
 }
 
-DLP_EXPORT JNIEXPORT jboolean JNICALL Java_com_android_server_DLPManagerService_Native_1Dlp_1SetDLPExpiry(
-        JNIEnv*, jobject, jint id, jint time) {
+DLP_EXPORT JNIEXPORT jboolean JNICALL
+Java_com_android_server_DLPManagerService_Native_1Dlp_1SetDLPExpiry(JNIEnv*, jobject, jint id,
+                                                                    jint time) {
     return set_expiryAfter_time(id, time) == 0 ? JNI_TRUE : JNI_FALSE;
 }
 
 DLP_EXPORT JNIEXPORT jboolean JNICALL
-Java_com_android_server_DLPManagerService_Native_1Dlp_1SetDLPExtension(JNIEnv* env, jobject, jint id,
-                                                                        jstring extensions) {
+Java_com_android_server_DLPManagerService_Native_1Dlp_1SetDLPExtension(JNIEnv* env, jobject,
+                                                                       jint id,
+                                                                       jstring extensions) {
     Utf8Chars chars(env, extensions);
     if (chars.get() == nullptr) return JNI_FALSE;
     return set_dlp_extension(id, chars.get()) >= 0 ? JNI_TRUE : JNI_FALSE;
 }
 
-DLP_EXPORT JNIEXPORT jboolean JNICALL Java_com_android_server_DLPManagerService_Native_1Dlp_1UnlockDLP(
-        JNIEnv*, jobject, jint id) {
+DLP_EXPORT JNIEXPORT jboolean JNICALL
+Java_com_android_server_DLPManagerService_Native_1Dlp_1UnlockDLP(JNIEnv*, jobject, jint id) {
     return unlock_dlp(id) >= 0 ? JNI_TRUE : JNI_FALSE;
 }
 
-DLP_EXPORT JNIEXPORT jboolean JNICALL Java_com_android_server_DLPManagerService_Native_1Dlp_1LockDLP(
-        JNIEnv*, jobject, jint id) {
+DLP_EXPORT JNIEXPORT jboolean JNICALL
+Java_com_android_server_DLPManagerService_Native_1Dlp_1LockDLP(JNIEnv*, jobject, jint id) {
     return lock_dlp(id) >= 0 ? JNI_TRUE : JNI_FALSE;
 }
 

@@ -51,7 +51,8 @@ int set_dlp_file_expiry_time(const char* path, long expiry) {
 long get_dlp_file_expiry_time(const char* path) {
     if (path == nullptr) {
         DLP_PRINT_ERROR(
-                "DLP_LIBDLP :  in get_dlp_file_expiry_time Error: getxattr(%s, getxattr error - %d, "
+                "DLP_LIBDLP :  in get_dlp_file_expiry_time Error: getxattr(%s, getxattr error - "
+                "%d, "
                 "%d, %s\n",
                 "(null)", -1, EINVAL, strerror(EINVAL));
         errno = EINVAL;
@@ -66,7 +67,8 @@ long get_dlp_file_expiry_time(const char* path) {
     }
     if (result != static_cast<int>(kExpiryValueSize)) {
         DLP_PRINT_ERROR(
-                "DLP_LIBDLP :  in get_dlp_file_expiry_time Error: getxattr(%s, getxattr error - %d, "
+                "DLP_LIBDLP :  in get_dlp_file_expiry_time Error: getxattr(%s, getxattr error - "
+                "%d, "
                 "%d, %s\n",
                 path, result, error, strerror(error));
         return -1;

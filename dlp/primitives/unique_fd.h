@@ -8,7 +8,7 @@ namespace dlp {
 
 // Owns a descriptor and closes it on every path, leaving errno as it was.
 class UniqueFd {
-public:
+  public:
     explicit UniqueFd(int fd) : fd_(fd) {}
     ~UniqueFd() {
         if (fd_ >= 0) {
@@ -23,7 +23,7 @@ public:
     int get() const { return fd_; }
     bool ok() const { return fd_ >= 0; }
 
-private:
+  private:
     int fd_;
 };
 

@@ -10,4 +10,6 @@ extern const std::string GALLERY_PACKAGE;
 extern const std::string HANCOM_OFFICE_PACKAGE;
 
 // What lookups hand back when they have no entry to offer.
-inline MapEntry emptyMapEntry() { return MapEntry{-1, "no_extension", -1, -1}; }
+inline MapEntry emptyMapEntry() {
+    return MapEntry{-1, "no_extension", -1, -1};
+}

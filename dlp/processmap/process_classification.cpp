@@ -6,8 +6,8 @@
 
 bool HashMap::isRejectedPid(int pid, MapEntry entry) {
     if (mRejectList.count(pid) != 0) {
-        DLP_SYSTEM_DEBUG("DLP_LIBDLP : <HashMap::isRejectedPid> pid [%d] belongs to rejected process",
-                         pid);
+        DLP_SYSTEM_DEBUG(
+                "DLP_LIBDLP : <HashMap::isRejectedPid> pid [%d] belongs to rejected process", pid);
         return true;
     }
     std::string processName = getProcessNameByPid(pid);
@@ -28,14 +28,16 @@ bool HashMap::isWhitelistedProcess(std::string processName, MapEntry entry) {
         int pid = entry.value_pid;
         checkAndDeleteProcessEntry(std::move(entry));
         if (processName == FILE_MANAGER_PACKAGE) {
-            DLP_SYSTEM_DEBUG("DLP_LIBDLP : <HashMap::isWhitelistedProcess> pid match with filbrook");
+            DLP_SYSTEM_DEBUG(
+                    "DLP_LIBDLP : <HashMap::isWhitelistedProcess> pid match with filbrook");
             mFileManagerPid = pid;
         }
         return true;
     }
     // The office suite runs several processes, all named after its package.
     if (processName.compare(0, HANCOM_OFFICE_PACKAGE.size(), HANCOM_OFFICE_PACKAGE) == 0) {
-        DLP_SYSTEM_DEBUG("DLP_LIBDLP : <HashMap::isWhitelistedProcess> pid match with Hancom process");
+        DLP_SYSTEM_DEBUG(
+                "DLP_LIBDLP : <HashMap::isWhitelistedProcess> pid match with Hancom process");
         return true;
     }
     return false;

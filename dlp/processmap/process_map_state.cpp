@@ -14,9 +14,9 @@ std::map<unsigned long, int> HashMap::mPendingInodeMap;
 
 HashMap::HashMap() : mLogState(0), mFileManagerPid(-1) {
     for (const char* extension :
-         {"xls", "xlsx", "doc", "docx", "ppt", "pptx", "pdf", "jpg", "jpeg", "mp4", "zip", "txt",
-          "asd", "xlam", "htm", "html", "mht", "eml", "msg", "hwp", "gul", "rtf", "ostrilex", "png",
-          "gif"}) {
+         {"xls", "xlsx", "doc", "docx", "ppt",      "pptx", "pdf",  "jpg", "jpeg",
+          "mp4", "zip",  "txt", "asd",  "xlam",     "htm",  "html", "mht", "eml",
+          "msg", "hwp",  "gul", "rtf",  "ostrilex", "png",  "gif"}) {
         mDefaultExtensions.push_back(extension);
     }
     makeExtensionGroups();

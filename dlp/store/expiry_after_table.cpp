@@ -44,7 +44,9 @@ constexpr std::array<int, kIdCount> emptyCache() {
 // Durations by id - 100; served without touching the database once filled.
 std::array<int, kIdCount> expiry_after_cache = emptyCache();
 
-bool isValidId(int id) { return id >= kFirstId && id < kFirstId + kIdCount; }
+bool isValidId(int id) {
+    return id >= kFirstId && id < kFirstId + kIdCount;
+}
 
 // `label` names the caller as its messages do ("init_table:", "set_time :", "get_time :").
 Database openDatabase(const char* label) {
@@ -122,9 +124,8 @@ int set_time(int id, int time) {
     if (select && sqlite3_step(select.get()) == SQLITE_ROW) {
         sql.reset(sqlite3_mprintf("Update dlpInfo Set Time = %d Where Id = %d", time, id));
     } else {
-        DLP_PRINT_ERROR(
-                "DLP_LIBEPM : set_time : id : %d, It is not in the table. add time as %d\n", id,
-                time);
+        DLP_PRINT_ERROR("DLP_LIBEPM : set_time : id : %d, It is not in the table. add time as %d\n",
+                        id, time);
         sql.reset(sqlite3_mprintf("INSERT INTO dlpInfo VALUES(%d, %d)", id, time));
     }
     SqliteText error;
@@ -139,8 +140,7 @@ int set_time(int id, int time) {
 int get_time(int id) {
     auto lock = dlp::lockLibraryState();
     if (!isValidId(id)) {
-        DLP_PRINT_ERROR("DLP_LIBEPM : get_time : error : id : %d, index : %d\n", id,
-                        id - kFirstId);
+        DLP_PRINT_ERROR("DLP_LIBEPM : get_time : error : id : %d, index : %d\n", id, id - kFirstId);
         return -1;
     }
     int& slot = expiry_after_cache[id - kFirstId];

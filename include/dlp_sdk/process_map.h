@@ -16,14 +16,15 @@ struct MapEntry {
 };
 
 class HashMap {
-public:
+  public:
     HashMap();
 
     // Extension lists and groups.
     int isValidExtension(std::string extension);
     int addExtension(std::string extension);
     DLP_EXPORT void makeExtensionGroups();
-    DLP_EXPORT int getValidMapEntryIndexForExt(std::string extension, std::vector<MapEntry> entries);
+    DLP_EXPORT int getValidMapEntryIndexForExt(std::string extension,
+                                               std::vector<MapEntry> entries);
 
     // Entries of opened files, per pid.
     bool put(int key, MapEntry value);

@@ -1,0 +1,16 @@
+#!/usr/bin/env bash
+# The project's test command: installs what is missing, builds everything, checks the formatting
+# and runs every test.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+
+tools/setup.sh
+
+build=${DLP_BUILD_DIR:-build}
+cmake -S . -B "$build" -DCMAKE_BUILD_TYPE=Release -DDLP_BUILD_TESTS=ON
+cmake --build "$build" -j "$(nproc)"
+
+tools/check-format.sh
+
+cd "$build"
+ctest --output-on-failure -j "$(nproc)"
