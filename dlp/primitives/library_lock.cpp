@@ -2,13 +2,11 @@
 
 namespace dlp {
 
-namespace {
-// Constant-initialised, so it is usable before any other static object is built.
-std::recursive_mutex libraryStateMutex;
-}  // namespace
-
 std::unique_lock<std::recursive_mutex> lockLibraryState() {
-    return std::unique_lock<std::recursive_mutex>(libraryStateMutex);
+    // Built on first use, which may come from another object's static construction; never
+    // destroyed, so threads still calling in while the process exits find it intact.
+    static std::recursive_mutex* libraryStateMutex = new std::recursive_mutex;
+    return std::unique_lock<std::recursive_mutex>(*libraryStateMutex);
 }
 
 }  // namespace dlp
