@@ -3,8 +3,10 @@
 #include <signal.h>
 #include <spawn.h>
 #include <sys/wait.h>
+#include <unistd.h>
 
 #include <cerrno>
+#include <fstream>
 #include <stdexcept>
 
 extern char** environ;
@@ -18,10 +20,19 @@ ChildProcess::ChildProcess(const std::string& name, const std::vector<std::strin
     std::vector<char*> argv;
     for (std::string& word : words) argv.push_back(word.data());
     argv.push_back(nullptr);
-    // glibc returns only after the exec, so /proc already shows the new command line.
     if (posix_spawn(&pid_, "/bin/sleep", nullptr, nullptr, argv.data(), environ) != 0) {
         throw std::runtime_error("cannot start /bin/sleep");
     }
+    // posix_spawn returns while the kernel still builds the child's new stack; until then its
+    // command line reads empty. Wait for it (bounded), so the child can be named at once.
+    std::string commandLine = "/proc/" + std::to_string(pid_) + "/cmdline";
+    for (int attempt = 0; attempt < 10000; ++attempt) {
+        if (std::ifstream(commandLine).get() != std::ifstream::traits_type::eof()) return;
+        usleep(1000);
+    }
+    kill(pid_, SIGKILL);
+    waitpid(pid_, nullptr, 0);
+    throw std::runtime_error("child " + std::to_string(pid_) + " never showed its command line");
 }
 
 ChildProcess::~ChildProcess() {
