@@ -1,0 +1,101 @@
+#include <dlp_sdk/pending_inode.h>
+
+#include <gtest/gtest.h>
+
+#include <climits>
+#include <map>
+
+#include "processmap/hash_map.h"
+#include "support/log_capture.h"
+#include "support/process_map_reset.h"
+
+namespace {
+
+using dlp::test::kError;
+using dlp::test::kSystemBuffer;
+using dlp::test::LogCapture;
+using PendingInodes = std::map<unsigned long, int>;
+
+const std::string kInvalidPut =
+        "DLP_LIBDLP : <putPendingInodeValue> Invalid parameter inode/pid. Return false";
+const std::string kInvalidGet =
+        "DLP_LIBDLP : <getPidByInode> Invalid parameter inode. Return false";
+
+class PendingInodeRegistryTest : public ::testing::Test {
+  protected:
+    void SetUp() override {
+        dlp::test::resetProcessMap();
+        log_.clear();
+    }
+    void TearDown() override { dlp::test::resetProcessMap(); }
+
+    // Exactly these messages, each an error on the system buffer.
+    void expectErrors(const std::vector<std::string>& texts) {
+        std::vector<dlp::test::LogRecord> records = log_.records();
+        ASSERT_EQ(records.size(), texts.size());
+        for (size_t i = 0; i < texts.size(); ++i) {
+            EXPECT_EQ(records[i].buffer, kSystemBuffer) << i;
+            EXPECT_EQ(records[i].priority, kError) << i;
+            EXPECT_EQ(records[i].text, texts[i]) << i;
+        }
+        log_.clear();
+    }
+
+    LogCapture log_;
+};
+
+TEST_F(PendingInodeRegistryTest, FirstParkedPidStaysUntilCleared) {
+    EXPECT_TRUE(putPendingInodeValue(42, 7));
+    EXPECT_TRUE(putPendingInodeValue(42, 9));
+    EXPECT_TRUE(mProcessMap.addPendingInode(42, 11));
+    EXPECT_EQ(getPidByInode(42), 7);
+    EXPECT_EQ(getPidByInode(42), 7);
+    EXPECT_TRUE(putPendingInodeValue(43, 0));
+    EXPECT_EQ(getPidByInode(43), 0);
+    EXPECT_EQ(getPidByInode(44), -1);
+    EXPECT_EQ(HashMap::mPendingInodeMap, (PendingInodes{{42, 7}, {43, 0}}));
+
+    EXPECT_TRUE(clearPendingInode(42));
+    EXPECT_EQ(getPidByInode(42), -1);
+    EXPECT_EQ(getPidByInode(43), 0);
+    EXPECT_TRUE(clearPendingInode(42));
+    EXPECT_TRUE(clearPendingInode(44));
+    EXPECT_TRUE(putPendingInodeValue(42, 9));
+    EXPECT_EQ(getPidByInode(42), 9);
+    EXPECT_EQ(HashMap::mPendingInodeMap, (PendingInodes{{42, 9}, {43, 0}}));
+    expectErrors({});
+}
+
+TEST_F(PendingInodeRegistryTest, InodeZeroAndNegativePidsAreRefused) {
+    ASSERT_TRUE(putPendingInodeValue(42, 7));
+    EXPECT_FALSE(putPendingInodeValue(42, -1));
+    EXPECT_FALSE(putPendingInodeValue(50, -1));
+    EXPECT_FALSE(putPendingInodeValue(0, 7));
+    EXPECT_FALSE(putPendingInodeValue(0, -1));
+    expectErrors({kInvalidPut, kInvalidPut, kInvalidPut, kInvalidPut});
+
+    EXPECT_EQ(getPidByInode(0), 0);
+    expectErrors({kInvalidGet});
+    EXPECT_FALSE(clearPendingInode(0));
+    expectErrors({});
+    EXPECT_EQ(HashMap::mPendingInodeMap, (PendingInodes{{42, 7}}));
+}
+
+TEST_F(PendingInodeRegistryTest, InodesAreFullUnsigned64BitKeys) {
+    const unsigned long largest = ULONG_MAX;
+    const unsigned long above32Bits = 1UL << 32;  // 0 when cut to 32 bits
+    EXPECT_TRUE(putPendingInodeValue(largest, 5));
+    EXPECT_TRUE(putPendingInodeValue(above32Bits, 8));
+    EXPECT_TRUE(putPendingInodeValue(1, 6));
+    EXPECT_EQ(getPidByInode(largest), 5);
+    EXPECT_EQ(getPidByInode(above32Bits), 8);
+    EXPECT_EQ(getPidByInode(largest - 1), -1);
+    EXPECT_EQ(HashMap::mPendingInodeMap, (PendingInodes{{1, 6}, {above32Bits, 8}, {largest, 5}}));
+
+    EXPECT_TRUE(clearPendingInode(above32Bits));
+    EXPECT_EQ(getPidByInode(above32Bits), -1);
+    EXPECT_EQ(getPidByInode(largest), 5);
+    expectErrors({});
+}
+
+}  // namespace
