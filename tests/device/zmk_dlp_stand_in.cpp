@@ -28,6 +28,8 @@
 #include <sstream>
 #include <string>
 
+#include "primitives/unique_fd.h"
+
 namespace {
 
 constexpr unsigned int kLockEnable = 0x40047801;
@@ -37,21 +39,7 @@ constexpr size_t kIdSize = 4;
 constexpr size_t kExtensionRecordSize = 1008;
 constexpr const char* kDefaultStateDirectory = "/run/zmk_dlp";
 
-class UniqueFd {
-  public:
-    explicit UniqueFd(int fd) : fd_(fd) {}
-    ~UniqueFd() {
-        if (fd_ >= 0) close(fd_);
-    }
-    UniqueFd(const UniqueFd&) = delete;
-    UniqueFd& operator=(const UniqueFd&) = delete;
-
-    int get() const { return fd_; }
-    bool ok() const { return fd_ >= 0; }
-
-  private:
-    int fd_;
-};
+using dlp::UniqueFd;
 
 std::string stateDirectory;
 
