@@ -1,7 +1,6 @@
 #include <dlp_sdk/dlp_device.h>
 #include <dlp_sdk/expiry_after_table.h>
 #include <dlp_sdk/expiry_attribute.h>
-#include <dlp_sdk/export.h>
 
 #include <jni.h>
 
@@ -30,7 +29,7 @@ class Utf8Chars {
 
 extern "C" {
 
-DLP_EXPORT JNIEXPORT jlong JNICALL
+JNIEXPORT jlong JNICALL
 Java_com_halvorn_android_zorvat_dlp_XattrManager_Native_1Dlp_1GetDLPFileExpiryTime(JNIEnv* env,
                                                                                    jobject,
                                                                                    jstring path) {
@@ -40,28 +39,26 @@ Java_com_halvorn_android_zorvat_dlp_XattrManager_Native_1Dlp_1GetDLPFileExpiryTi
     return static_cast<jlong>(get_dlp_file_expiry_time(chars.get()));
 }
 
-DLP_EXPORT JNIEXPORT jboolean JNICALL
-Java_com_android_server_DLPManagerService_Native_1Dlp_1SetDLPExpiry(JNIEnv*, jobject, jint id,
-                                                                    jint time) {
+JNIEXPORT jboolean JNICALL Java_com_android_server_DLPManagerService_Native_1Dlp_1SetDLPExpiry(
+        JNIEnv*, jobject, jint id, jint time) {
     return set_expiryAfter_time(id, time) == 0 ? JNI_TRUE : JNI_FALSE;
 }
 
-DLP_EXPORT JNIEXPORT jboolean JNICALL
-Java_com_android_server_DLPManagerService_Native_1Dlp_1SetDLPExtension(JNIEnv* env, jobject,
-                                                                       jint id,
-                                                                       jstring extensions) {
+JNIEXPORT jboolean JNICALL Java_com_android_server_DLPManagerService_Native_1Dlp_1SetDLPExtension(
+        JNIEnv* env, jobject, jint id, jstring extensions) {
     Utf8Chars chars(env, extensions);
     if (chars.get() == nullptr) return JNI_FALSE;
     return set_dlp_extension(id, chars.get()) >= 0 ? JNI_TRUE : JNI_FALSE;
 }
 
-DLP_EXPORT JNIEXPORT jboolean JNICALL
+JNIEXPORT jboolean JNICALL
 Java_com_android_server_DLPManagerService_Native_1Dlp_1UnlockDLP(JNIEnv*, jobject, jint id) {
     return unlock_dlp(id) >= 0 ? JNI_TRUE : JNI_FALSE;
 }
 
-DLP_EXPORT JNIEXPORT jboolean JNICALL
-Java_com_android_server_DLPManagerService_Native_1Dlp_1LockDLP(JNIEnv*, jobject, jint id) {
+JNIEXPORT jboolean JNICALL Java_com_android_server_DLPManagerService_Native_1Dlp_1LockDLP(JNIEnv*,
+                                                                                          jobject,
+                                                                                          jint id) {
     return lock_dlp(id) >= 0 ? JNI_TRUE : JNI_FALSE;
 }
 
