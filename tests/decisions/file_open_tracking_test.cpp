@@ -6,10 +6,12 @@
 #include <ctime>
 #include <string>
 
-#include "decisions/decision_test_support.h"
+#include "decisions/frozen_clock.h"
 #include "decisions/path_extension.h"
+#include "support/library_messages.h"
 #include "support/log_capture.h"
 #include "support/process_map_reset.h"
+#include "support/scratch_directory.h"
 
 namespace dlp::test {
 namespace {
@@ -18,26 +20,24 @@ constexpr int kPid = 4242;
 
 // A freshly loaded process map, a directory for the reported files and the log.
 struct TrackingScene {
-    TrackingScene() { resetProcessMap(); }
-    ~TrackingScene() { resetProcessMap(); }
-
     std::vector<MapEntry> entriesOf(int pid) const {
         auto found = HashMap::mInternalProcessMap.find(pid);
         return found == HashMap::mInternalProcessMap.end() ? std::vector<MapEntry>{}
                                                            : found->second;
     }
 
+    FreshProcessMap map;
     ScratchDirectory directory;
     LogCapture log;
 };
 
-std::string refusalMessage(long now, long expiry) {
-    return "DLP_LIBDLP : <HashMap::addOrUpdateMapEntry> curTime[" + low32(now) +
-           "], entryInMap.value_expiry[" + low32(expiry) + "] ignoring add to map";
+LogRecord refusalMessage(long now, long expiry) {
+    return systemError("DLP_LIBDLP : <HashMap::addOrUpdateMapEntry> curTime[" + low32(now) +
+                       "], entryInMap.value_expiry[" + low32(expiry) + "] ignoring add to map");
 }
 
-std::string recordMessage(const std::string& path) {
-    return "DLP_LIBDLP : <addOrUpdateMapEntry> addOrUpdate for file[" + path + "]";
+LogRecord recordMessage(const std::string& path) {
+    return systemDebug("DLP_LIBDLP : <addOrUpdateMapEntry> addOrUpdate for file[" + path + "]");
 }
 
 TEST(getExtensionFromPath, TakesLowerCasedTextAfterLastDotOfWholePath) {
@@ -63,9 +63,9 @@ TEST(getCurrentTimeInSec, ReadsSecondsOfWallClock) {
 TEST(addOrUpdateMapEntry, RefusesNullPath) {
     TrackingScene scene;
     EXPECT_FALSE(addOrUpdateMapEntry(kPid, nullptr));
-    EXPECT_TRUE(scene.log.contains(
-            kSystemBuffer, kError,
-            "DLP_LIBDLP : <addOrUpdateMapEntry> file path is null. return false"));
+    expectRecords(
+            scene.log,
+            {systemError("DLP_LIBDLP : <addOrUpdateMapEntry> file path is null. return false")});
     EXPECT_TRUE(HashMap::mInternalProcessMap.empty());
 }
 
@@ -81,11 +81,11 @@ TEST(addOrUpdateMapEntry, IgnoresFilesWithoutFutureExpiry) {
     long last = getCurrentTimeInSec();
 
     EXPECT_TRUE(scene.entriesOf(kPid).empty());
-    EXPECT_EQ(countForSecondsBetween(scene.log, kError, first, last,
+    EXPECT_EQ(countForSecondsBetween(scene.log, first, last,
                                      [](long second) { return refusalMessage(second, -1); }),
               1u);
     EXPECT_EQ(
-            countForSecondsBetween(scene.log, kError, first, last,
+            countForSecondsBetween(scene.log, first, last,
                                    [&](long second) { return refusalMessage(second, now - 100); }),
             1u);
     EXPECT_TRUE(scene.log.matching("<addOrUpdateMapEntry> addOrUpdate").empty());
@@ -108,28 +108,8 @@ TEST(addOrUpdateMapEntry, RecordsProtectedFileWithLowerCasedExtension) {
     EXPECT_EQ(entries[0].value_expiry, expiry);
     EXPECT_GE(entries[0].value_opentime, first);
     EXPECT_LE(entries[0].value_opentime, last);
-    EXPECT_EQ(scene.log.count(kSystemBuffer, kDebug, recordMessage(path)), 1u);
+    EXPECT_EQ(scene.log.count(recordMessage(path)), 1u);
     EXPECT_TRUE(scene.log.matching("ignoring add to map").empty());
-}
-
-TEST(addOrUpdateMapEntry, KeepsOneEntryPerExtensionWithLatestReportLast) {
-    TrackingScene scene;
-    long now = time(nullptr);
-    std::string firstPdf = scene.directory.stampedFile("first.pdf", now + 1000);
-    std::string letter = scene.directory.stampedFile("letter.docx", now + 2000);
-    std::string secondPdf = scene.directory.stampedFile("second.pdf", now + 3000);
-
-    for (std::string* path : {&firstPdf, &letter, &secondPdf}) {
-        EXPECT_TRUE(addOrUpdateMapEntry(kPid, path->data()));
-    }
-
-    std::vector<MapEntry> entries = scene.entriesOf(kPid);
-    ASSERT_EQ(entries.size(), 2u);
-    EXPECT_EQ(entries[0].value_extension, "docx");
-    EXPECT_EQ(entries[0].value_expiry, now + 2000);
-    EXPECT_EQ(entries[1].value_extension, "pdf");
-    EXPECT_EQ(entries[1].value_expiry, now + 3000);
-    EXPECT_TRUE(scene.entriesOf(kPid + 1).empty());
 }
 
 TEST(addOrUpdateMapEntry, LeavesUnprotectedExtensionsToStoreRefusal) {
@@ -143,11 +123,8 @@ TEST(addOrUpdateMapEntry, LeavesUnprotectedExtensionsToStoreRefusal) {
     EXPECT_TRUE(addOrUpdateMapEntry(kPid, page.data()));
 
     EXPECT_TRUE(HashMap::mInternalProcessMap.empty());
-    EXPECT_EQ(scene.log.count(kSystemBuffer, kDebug, recordMessage(notes)), 1u);
-    EXPECT_EQ(scene.log.count(kSystemBuffer, kError,
-                              "DLP_LIBDLP : <HashMap::put> extension passed is not valid. ignoring "
-                              "add to map"),
-              2u);
+    EXPECT_EQ(scene.log.count(recordMessage(notes)), 1u);
+    EXPECT_EQ(scene.log.count(unprotectedExtensionMessage()), 2u);
 }
 
 // Runs under a frozen clock past 2^32 seconds, so that "%d" shows only the low 32 bits.
@@ -159,7 +136,7 @@ TEST(addOrUpdateMapEntry, ComparesExpiryWithCurrentSecondAtFixedTime) {
     std::string expiringNext = scene.directory.stampedFile("next.docx", *now + 1);
 
     EXPECT_TRUE(addOrUpdateMapEntry(kPid, expiringNow.data()));
-    EXPECT_EQ(scene.log.count(kSystemBuffer, kError, refusalMessage(*now, *now)), 1u);
+    EXPECT_EQ(scene.log.count(refusalMessage(*now, *now)), 1u);
     EXPECT_TRUE(scene.entriesOf(kPid).empty());
 
     EXPECT_TRUE(addOrUpdateMapEntry(kPid, expiringNext.data()));

@@ -8,7 +8,6 @@
 #include <dlp_sdk/process_map.h>
 #include <dlp_sdk/process_name.h>
 #include <gtest/gtest.h>
-#include <sqlite3.h>
 
 #include <atomic>
 #include <ctime>
@@ -17,9 +16,12 @@
 #include <thread>
 #include <vector>
 
-#include "decisions/decision_test_support.h"
 #include "support/child_process.h"
+#include "support/command_vector.h"
+#include "support/duration_database.h"
+#include "support/expiry_attribute_bytes.h"
 #include "support/process_map_reset.h"
+#include "support/scratch_directory.h"
 
 namespace dlp::test {
 namespace {
@@ -142,27 +144,9 @@ struct Worker {
     const ScratchDirectory& directory;
 };
 
-// Every duration row as the database holds it, by container id.
-std::multimap<int, int> storedDurations() {
-    std::multimap<int, int> rows;
-    sqlite3* database = nullptr;
-    EXPECT_EQ(sqlite3_open_v2("/data/system/users/dlp/dlpinfo.db", &database, SQLITE_OPEN_READONLY,
-                              nullptr),
-              SQLITE_OK);
-    sqlite3_stmt* select = nullptr;
-    EXPECT_EQ(sqlite3_prepare_v2(database, "SELECT Id, Time FROM dlpInfo", -1, &select, nullptr),
-              SQLITE_OK);
-    while (select != nullptr && sqlite3_step(select) == SQLITE_ROW) {
-        rows.emplace(sqlite3_column_int(select, 0), sqlite3_column_int(select, 1));
-    }
-    sqlite3_finalize(select);
-    sqlite3_close(database);
-    return rows;
-}
-
 TEST(lockLibraryState, KeepsEveryThreadsStateWhenAllEntryPointsRunConcurrently) {
     SKIP_UNLESS_DATABASE_IS_THROWAWAY();
-    resetProcessMap();
+    FreshProcessMap freshMap;
     ScratchDirectory directory;
     long now = time(nullptr);
     std::vector<std::unique_ptr<Worker>> workers;
@@ -184,7 +168,8 @@ TEST(lockLibraryState, KeepsEveryThreadsStateWhenAllEntryPointsRunConcurrently) 
     for (std::thread& thread : threads) thread.join();
     __android_log_set_logger(__android_log_stderr_logger);
 
-    std::multimap<int, int> rows = storedDurations();
+    std::vector<std::pair<int, int>> rowList = DurationDatabase().rows();
+    std::multimap<int, int> rows(rowList.begin(), rowList.end());
     for (const auto& worker : workers) {
         const int t = worker->index;
         const std::vector<MapEntry>& galleryEntries =
@@ -227,7 +212,6 @@ TEST(lockLibraryState, KeepsEveryThreadsStateWhenAllEntryPointsRunConcurrently) 
     EXPECT_EQ(mProcessMap.mRejectList.size(), static_cast<size_t>(kThreads * kIterations));
     EXPECT_EQ(mProcessMap.mExtensionList, (std::vector<std::string>{"abc", "def"}));
     EXPECT_EQ(rows.size(), 100u);
-    resetProcessMap();
 }
 
 }  // namespace

@@ -27,12 +27,8 @@
 
 #include "support/log_capture.h"
 
+namespace dlp::test {
 namespace {
-
-using dlp::test::kError;
-using dlp::test::kMainBuffer;
-using dlp::test::LogCapture;
-using dlp::test::LogRecord;
 
 constexpr const char* kDevicePath = "/dev/zmk_dlp";
 constexpr uint32_t kLockEnable = 0x40047801;
@@ -42,25 +38,7 @@ constexpr size_t kExtensionRecordSize = 1008;
 // "0x%08x " in front of the argument bytes of a `requests` line.
 constexpr size_t kRequestLinePrefixSize = 11;
 
-std::string describe(const LogRecord& record) {
-    return "buffer " + std::to_string(record.buffer) + ", priority " +
-           std::to_string(record.priority) + ": \"" + record.text + "\"";
-}
-
-// How a message of the device functions must look: error priority, main buffer.
-std::string mainError(const std::string& text) {
-    return describe(LogRecord{kMainBuffer, kError, text});
-}
-
-std::vector<std::string> describe(const std::vector<LogRecord>& records) {
-    std::vector<std::string> descriptions;
-    for (const LogRecord& record : records) descriptions.push_back(describe(record));
-    return descriptions;
-}
-
-std::string cannotOpenMessage() {
-    return mainError("DLP_LIBDLP :  Can't open device file: /dev/zmk_dlp\n");
-}
+const LogRecord kCannotOpen = mainError("DLP_LIBDLP :  Can't open device file: /dev/zmk_dlp\n");
 
 std::vector<uint8_t> littleEndian(int32_t id) {
     const uint32_t value = static_cast<uint32_t>(id);
@@ -184,8 +162,6 @@ class DlpDeviceTest : public testing::Test {
         std::ofstream(stateDirectory_ + "/fail") << lines;
     }
 
-    std::vector<std::string> messages() const { return describe(log_.records()); }
-
     LogCapture log_;
     std::string stateDirectory_;
     size_t descriptorsBefore_ = 0;
@@ -205,10 +181,9 @@ TEST_F(DlpDeviceTest, LockAndUnlockSendTheIdAsFourLittleEndianBytes) {
                                         requestLine(kLockEnable, littleEndian(-2))}));
     EXPECT_EQ(receivedRequests()[2], "0x40047801 feffffff");
     EXPECT_EQ(deviceOpens(), readOnlyOpens(3));
-    EXPECT_EQ(messages(),
-              (std::vector<std::string>{mainError("DLP_LIBDLP :  lock_dlp : for 16909060\n"),
-                                        mainError("DLP_LIBDLP :  unlock_dlp : for 16909060\n"),
-                                        mainError("DLP_LIBDLP :  lock_dlp : for -2\n")}));
+    expectRecords(log_, {mainError("DLP_LIBDLP :  lock_dlp : for 16909060\n"),
+                         mainError("DLP_LIBDLP :  unlock_dlp : for 16909060\n"),
+                         mainError("DLP_LIBDLP :  lock_dlp : for -2\n")});
 }
 
 TEST_F(DlpDeviceTest, SetDlpExtensionSendsTheIdAndTheZeroFilledText) {
@@ -225,7 +200,7 @@ TEST_F(DlpDeviceTest, SetDlpExtensionSendsTheIdAndTheZeroFilledText) {
     EXPECT_EQ(requests[1], requestLine(kExtensionSet, extensionRecord(3, "")));
     EXPECT_EQ(deviceOpens(), readOnlyOpens(2));
     // No message on success.
-    EXPECT_EQ(messages(), std::vector<std::string>{});
+    expectRecords(log_, {});
 }
 
 TEST_F(DlpDeviceTest, SetDlpExtensionAcceptsAtMostOneThousandBytesOfText) {
@@ -238,12 +213,11 @@ TEST_F(DlpDeviceTest, SetDlpExtensionAcceptsAtMostOneThousandBytesOfText) {
     EXPECT_EQ(requests[0].size(), kRequestLinePrefixSize + 2 * kExtensionRecordSize);
     EXPECT_EQ(requests[0].substr(kRequestLinePrefixSize + 2 * 1004), "00000000")
             << "bytes 1004 to 1007";
-    EXPECT_EQ(messages(), std::vector<std::string>{});
+    expectRecords(log_, {});
 
     const std::string tooLong = longest + "x";
     EXPECT_EQ(set_dlp_extension(7, tooLong.c_str()), -1);
-    EXPECT_EQ(messages(), std::vector<std::string>{mainError(
-                                  "DLP_LIBDLP :  Extension length exceeds defined length")});
+    expectRecords(log_, {mainError("DLP_LIBDLP :  Extension length exceeds defined length")});
     EXPECT_EQ(receivedRequests().size(), 1u) << "the refused text reached the device";
     // The device is opened before the text is measured.
     EXPECT_EQ(deviceOpens(), readOnlyOpens(2));
@@ -257,15 +231,12 @@ TEST_F(DlpDeviceTest, RefusedRequestsFailWithTheDeviceError) {
     EXPECT_EQ(lock_dlp(2), -1);
     EXPECT_EQ(unlock_dlp(3), -1);
 
-    EXPECT_EQ(
-            messages(),
-            (std::vector<std::string>{
-                    mainError("DLP_LIBDLP :  DLP_EXTENSION_SET failed: Operation not permitted\n"),
-                    mainError("DLP_LIBDLP :  lock_dlp : for 2\n"),
-                    mainError("DLP_LIBDLP :  DLP_LOCK_ENABLE failed: Input/output error\n"),
-                    mainError("DLP_LIBDLP :  unlock_dlp : for 3\n"),
-                    mainError("DLP_LIBDLP :  DLP_LOCK_DISABLE failed: Device or resource busy\n"),
-            }));
+    expectRecords(log_,
+                  {mainError("DLP_LIBDLP :  DLP_EXTENSION_SET failed: Operation not permitted\n"),
+                   mainError("DLP_LIBDLP :  lock_dlp : for 2\n"),
+                   mainError("DLP_LIBDLP :  DLP_LOCK_ENABLE failed: Input/output error\n"),
+                   mainError("DLP_LIBDLP :  unlock_dlp : for 3\n"),
+                   mainError("DLP_LIBDLP :  DLP_LOCK_DISABLE failed: Device or resource busy\n")});
     EXPECT_EQ(receivedRequests(),
               (std::vector<std::string>{requestLine(kExtensionSet, extensionRecord(1, "pdf")),
                                         requestLine(kLockEnable, littleEndian(2)),
@@ -292,24 +263,19 @@ TEST_F(DlpDeviceTest, MissingDeviceNodeFailsEveryCall) {
         EXPECT_EQ(lock_dlp(2), -1);
         EXPECT_EQ(unlock_dlp(3), -1);
     }
-    EXPECT_EQ(messages(), (std::vector<std::string>{
-                                  cannotOpenMessage(),
-                                  cannotOpenMessage(),
-                                  mainError("DLP_LIBDLP :  lock_dlp : for 2\n"),
-                                  cannotOpenMessage(),
-                                  mainError("DLP_LIBDLP :  unlock_dlp : for 3\n"),
-                                  cannotOpenMessage(),
-                          }));
+    expectRecords(log_,
+                  {kCannotOpen, kCannotOpen, mainError("DLP_LIBDLP :  lock_dlp : for 2\n"),
+                   kCannotOpen, mainError("DLP_LIBDLP :  unlock_dlp : for 3\n"), kCannotOpen});
     EXPECT_EQ(deviceOpens(), std::vector<std::string>{});
     EXPECT_EQ(receivedRequests(), std::vector<std::string>{});
 }
 
 TEST_F(DlpDeviceTest, NullExtensionTextIsRefusedBeforeTheDeviceIsOpened) {
     EXPECT_EQ(set_dlp_extension(1, nullptr), -1);
-    EXPECT_EQ(messages(),
-              std::vector<std::string>{mainError("DLP_LIBDLP :  Extension list is null")});
+    expectRecords(log_, {mainError("DLP_LIBDLP :  Extension list is null")});
     EXPECT_EQ(deviceOpens(), std::vector<std::string>{});
     EXPECT_EQ(receivedRequests(), std::vector<std::string>{});
 }
 
 }  // namespace
+}  // namespace dlp::test

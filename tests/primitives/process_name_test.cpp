@@ -1,33 +1,22 @@
 #include <dlp_sdk/process_name.h>
-
 #include <gtest/gtest.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <fstream>
 #include <string>
-#include <vector>
 
 #include "support/child_process.h"
+#include "support/library_messages.h"
 #include "support/log_capture.h"
 
+namespace dlp::test {
 namespace {
 
-using dlp::test::ChildProcess;
-
-using dlp::test::kDebug;
-using dlp::test::kSystemBuffer;
-using dlp::test::LogCapture;
-
-// Looks the name up and checks that the one debug message names the pid and the result.
+// Looks the name up and checks that the one message names the pid and the result.
 std::string nameOf(pid_t pid) {
     LogCapture log;
     std::string name = getProcessNameByPid(pid);
-    std::vector<dlp::test::LogRecord> records = log.records();
-    EXPECT_EQ(records.size(), 1u);
-    EXPECT_TRUE(log.contains(kSystemBuffer, kDebug,
-                             "DLP_LIBDLP : <getProcessNameByPid> pid[" + std::to_string(pid) +
-                                     "], processName[" + name + "]"));
+    expectRecords(log, {processNameMessage(pid, name)});
     return name;
 }
 
@@ -59,8 +48,9 @@ TEST(ProcessNameTest, EndedAndUnknownProcesses) {
     ended.killWithoutReaping();
     EXPECT_EQ(nameOf(ended.pid()), "");
 
-    EXPECT_EQ(nameOf(dlp::test::unusedPid()), "???");
+    EXPECT_EQ(nameOf(unusedPid()), "???");
     EXPECT_EQ(nameOf(-1), "???");
 }
 
 }  // namespace
+}  // namespace dlp::test

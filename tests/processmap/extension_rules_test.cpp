@@ -4,24 +4,18 @@
 #include <vector>
 
 #include "processmap/hash_map.h"
+#include "support/library_messages.h"
 #include "support/log_capture.h"
 #include "support/process_map_reset.h"
 
+namespace dlp::test {
 namespace {
 
-using dlp::test::kError;
-using dlp::test::kSystemBuffer;
-using dlp::test::LogCapture;
 using Tokens = std::vector<std::string>;
 
 class ExtensionRulesTest : public ::testing::Test {
   protected:
-    void SetUp() override {
-        dlp::test::resetProcessMap();
-        log_.clear();
-    }
-    void TearDown() override { dlp::test::resetProcessMap(); }
-
+    FreshProcessMap map_;
     LogCapture log_;
 };
 
@@ -37,11 +31,6 @@ int relatedIndex(const std::string& extension, const Tokens& extensions) {
     return mProcessMap.getValidMapEntryIndexForExt(extension, entriesWith(extensions));
 }
 
-std::string missingGroup(const std::string& extension) {
-    return "DLP_LIBDLP : <HashMap::getValidMapEntryIndexForExt> record with key[" + extension +
-           "] not found.";
-}
-
 TEST_F(ExtensionRulesTest, ProtectedExtensionsAreComparedByteForByte) {
     for (const std::string& extension : mProcessMap.mDefaultExtensions) {
         EXPECT_EQ(mProcessMap.isValidExtension(extension), 1) << extension;
@@ -50,7 +39,7 @@ TEST_F(ExtensionRulesTest, ProtectedExtensionsAreComparedByteForByte) {
     for (const char* refused : {"PDF", "Pdf", "tmp", "", " pdf", "pdf ", "pd", "pdfx", ".pdf"}) {
         EXPECT_EQ(mProcessMap.isValidExtension(refused), 0) << refused;
     }
-    EXPECT_TRUE(log_.records().empty());
+    expectRecords(log_, {});
 }
 
 TEST_F(ExtensionRulesTest, AddExtensionKeepsOneCopyOfEachNewExtension) {
@@ -79,13 +68,9 @@ TEST_F(ExtensionRulesTest, GetExtensionsSplitsAtEveryDelimiter) {
     EXPECT_EQ(getExtensions(" Pdf,DOCX ,pdf,pdf", ','), (Tokens{" Pdf", "DOCX ", "pdf", "pdf"}));
     EXPECT_EQ(getExtensions("pdf;docx", ','), (Tokens{"pdf;docx"}));
     EXPECT_EQ(getExtensions("pdf;docx,txt", ';'), (Tokens{"pdf", "docx,txt"}));
-    EXPECT_TRUE(log_.records().empty());
-
-    const std::string empty = "DLP_LIBDLP : <getExtensions> extention list is empty \n";
     EXPECT_EQ(getExtensions("", ','), Tokens{});
     EXPECT_EQ(getExtensions(nullptr, ','), Tokens{});
-    EXPECT_EQ(log_.count(kSystemBuffer, kError, empty), 2u);
-    EXPECT_EQ(log_.records().size(), 2u);
+    expectRecords(log_, {emptyExtensionListMessage(), emptyExtensionListMessage()});
     EXPECT_TRUE(mProcessMap.mExtensionList.empty());
 }
 
@@ -139,21 +124,16 @@ TEST_F(ExtensionRulesTest, RelatedEntryIsTheMostRecentOfTheGroup) {
     EXPECT_EQ(relatedIndex("xlsx", {"pdf", "xls"}), 1);
     EXPECT_EQ(relatedIndex("xls", {"xls"}), -2);
     EXPECT_EQ(relatedIndex("xlsx", {"xlsx"}), -2);
-    EXPECT_TRUE(log_.records().empty());
+    expectRecords(log_, {});
 }
 
 TEST_F(ExtensionRulesTest, ExtensionWithoutGroupIsReported) {
     EXPECT_EQ(relatedIndex("pdf", {"pdf", "docx"}), -2);
     EXPECT_EQ(relatedIndex("pdf", {}), -2);
     EXPECT_EQ(relatedIndex("DOC", {"docx"}), -2);
-    std::vector<dlp::test::LogRecord> records = log_.records();
-    ASSERT_EQ(records.size(), 3u);
-    const std::string expected[] = {missingGroup("pdf"), missingGroup("pdf"), missingGroup("DOC")};
-    for (size_t i = 0; i < records.size(); ++i) {
-        EXPECT_EQ(records[i].buffer, kSystemBuffer);
-        EXPECT_EQ(records[i].priority, kError);
-        EXPECT_EQ(records[i].text, expected[i]);
-    }
+    expectRecords(log_, {missingGroupMessage("pdf"), missingGroupMessage("pdf"),
+                         missingGroupMessage("DOC")});
 }
 
 }  // namespace
+}  // namespace dlp::test

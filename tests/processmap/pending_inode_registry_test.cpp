@@ -9,38 +9,19 @@
 #include "support/log_capture.h"
 #include "support/process_map_reset.h"
 
+namespace dlp::test {
 namespace {
 
-using dlp::test::kError;
-using dlp::test::kSystemBuffer;
-using dlp::test::LogCapture;
 using PendingInodes = std::map<unsigned long, int>;
 
-const std::string kInvalidPut =
-        "DLP_LIBDLP : <putPendingInodeValue> Invalid parameter inode/pid. Return false";
-const std::string kInvalidGet =
-        "DLP_LIBDLP : <getPidByInode> Invalid parameter inode. Return false";
+const LogRecord kInvalidPut = systemError(
+        "DLP_LIBDLP : <putPendingInodeValue> Invalid parameter inode/pid. Return false");
+const LogRecord kInvalidGet =
+        systemError("DLP_LIBDLP : <getPidByInode> Invalid parameter inode. Return false");
 
 class PendingInodeRegistryTest : public ::testing::Test {
   protected:
-    void SetUp() override {
-        dlp::test::resetProcessMap();
-        log_.clear();
-    }
-    void TearDown() override { dlp::test::resetProcessMap(); }
-
-    // Exactly these messages, each an error on the system buffer.
-    void expectErrors(const std::vector<std::string>& texts) {
-        std::vector<dlp::test::LogRecord> records = log_.records();
-        ASSERT_EQ(records.size(), texts.size());
-        for (size_t i = 0; i < texts.size(); ++i) {
-            EXPECT_EQ(records[i].buffer, kSystemBuffer) << i;
-            EXPECT_EQ(records[i].priority, kError) << i;
-            EXPECT_EQ(records[i].text, texts[i]) << i;
-        }
-        log_.clear();
-    }
-
+    FreshProcessMap map_;
     LogCapture log_;
 };
 
@@ -63,7 +44,7 @@ TEST_F(PendingInodeRegistryTest, FirstParkedPidStaysUntilCleared) {
     EXPECT_TRUE(putPendingInodeValue(42, 9));
     EXPECT_EQ(getPidByInode(42), 9);
     EXPECT_EQ(HashMap::mPendingInodeMap, (PendingInodes{{42, 9}, {43, 0}}));
-    expectErrors({});
+    expectRecords(log_, {});
 }
 
 TEST_F(PendingInodeRegistryTest, InodeZeroAndNegativePidsAreRefused) {
@@ -72,12 +53,12 @@ TEST_F(PendingInodeRegistryTest, InodeZeroAndNegativePidsAreRefused) {
     EXPECT_FALSE(putPendingInodeValue(50, -1));
     EXPECT_FALSE(putPendingInodeValue(0, 7));
     EXPECT_FALSE(putPendingInodeValue(0, -1));
-    expectErrors({kInvalidPut, kInvalidPut, kInvalidPut, kInvalidPut});
+    expectRecords(log_, {kInvalidPut, kInvalidPut, kInvalidPut, kInvalidPut});
 
     EXPECT_EQ(getPidByInode(0), 0);
-    expectErrors({kInvalidGet});
+    expectRecords(log_, {kInvalidGet});
     EXPECT_FALSE(clearPendingInode(0));
-    expectErrors({});
+    expectRecords(log_, {});
     EXPECT_EQ(HashMap::mPendingInodeMap, (PendingInodes{{42, 7}}));
 }
 
@@ -95,7 +76,8 @@ TEST_F(PendingInodeRegistryTest, InodesAreFullUnsigned64BitKeys) {
     EXPECT_TRUE(clearPendingInode(above32Bits));
     EXPECT_EQ(getPidByInode(above32Bits), -1);
     EXPECT_EQ(getPidByInode(largest), 5);
-    expectErrors({});
+    expectRecords(log_, {});
 }
 
 }  // namespace
+}  // namespace dlp::test

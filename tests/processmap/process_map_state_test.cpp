@@ -1,20 +1,18 @@
 #include <dlfcn.h>
 #include <gtest/gtest.h>
-#include <sys/xattr.h>
 #include <unistd.h>
 
-#include <cstdlib>
 #include <ctime>
-#include <fstream>
 #include <string>
 #include <vector>
 
 #include "processmap/hash_map.h"
 #include "support/child_process.h"
+#include "support/command_vector.h"
+#include "support/scratch_directory.h"
 
+namespace dlp::test {
 namespace {
-
-using dlp::test::ChildProcess;
 
 using ProcessEntries = std::map<int, std::vector<MapEntry>>;
 using PendingInodes = std::map<unsigned long, int>;
@@ -24,21 +22,12 @@ const std::vector<std::string> kDefaultExtensions = {
         "mp4", "zip",  "txt", "asd",  "xlam",     "htm",  "html", "mht", "eml",
         "msg", "hwp",  "gul", "rtf",  "ostrilex", "png",  "gif"};
 
-const std::vector<std::string> kGroupKeys = {"doc",  "docx", "gif", "htm", "html",
-                                             "jpeg", "jpg",  "png", "ppt", "pptx",
-                                             "rtf",  "tmp",  "txt", "xls", "xlsx"};
-
-std::vector<std::string> groupKeysOf(const HashMap& map) {
-    std::vector<std::string> keys;
-    for (const auto& group : map.mExtensionGroups) keys.push_back(group.first);
-    return keys;
-}
-
 void expectStateAfterLoad(const HashMap& map, const ProcessEntries& entries,
                           const PendingInodes& inodes, ProcessEntries::iterator iterator,
                           int auditLogState) {
     EXPECT_EQ(map.mDefaultExtensions, kDefaultExtensions);
-    EXPECT_EQ(groupKeysOf(map), kGroupKeys);
+    // The table itself is the extension rules' business.
+    EXPECT_EQ(map.mExtensionGroups, HashMap().mExtensionGroups);
     EXPECT_TRUE(map.mExtensionList.empty());
     EXPECT_TRUE(map.mRejectList.empty());
     EXPECT_EQ(map.mLogState, 0);
@@ -93,11 +82,8 @@ class SharedLibrary {
     }
     int auditLogState() const { return find<int()>("_Z19getDLPAuditLogStatev")(); }
 
-    int command(std::vector<std::string> words) const {
-        std::vector<char*> argv;
-        for (std::string& word : words) argv.push_back(word.data());
-        return find<int(int, char**)>("_Z17handleDLPCommandsiPPc")(static_cast<int>(argv.size()),
-                                                                   argv.data());
+    int command(const std::vector<std::string>& words) const {
+        return runCommand(words, find<int(int, char**)>("_Z17handleDLPCommandsiPPc"));
     }
 
     bool hasSymbols() const {
@@ -118,30 +104,10 @@ class SharedLibrary {
     void* handle_;
 };
 
-// A protected file that expires in 2033, removed at the end.
-class OpenedFile {
-  public:
-    OpenedFile() {
-        char pattern[] = "/tmp/process_map_state_test.XXXXXX.pdf";
-        int descriptor = mkstemps(pattern, 4);
-        if (descriptor >= 0) close(descriptor);
-        path_ = pattern;
-        const unsigned char expiry[16] = {0x00, 0x94, 0x35, 0x77};  // 2000000000
-        stamped_ = setxattr(pattern, "user.zorvat_dlp", expiry, sizeof(expiry), 0) == 0;
-    }
-    ~OpenedFile() { unlink(path_.c_str()); }
-    bool stamped() const { return stamped_; }
-    std::string& path() { return path_; }
-
-  private:
-    std::string path_;
-    bool stamped_;
-};
-
 TEST(ProcessMapStateTest, ReloadingTheSharedLibraryForgetsEverything) {
     ASSERT_FALSE(SharedLibrary::isLoaded());
-    OpenedFile opened;
-    ASSERT_TRUE(opened.stamped());
+    ScratchDirectory directory;
+    std::string opened = directory.stampedFile("opened.pdf", 2000000000);
     ChildProcess fileManager("com.vux.android.app.filbrook");
 
     {
@@ -151,17 +117,16 @@ TEST(ProcessMapStateTest, ReloadingTheSharedLibraryForgetsEverything) {
         expectStateAfterLoad(library.processMap(), library.entries(), library.inodes(),
                              library.iterator(), library.auditLogState());
 
-        EXPECT_EQ(library.command({"dlp", "6", "100", "2"}), 0);
-        EXPECT_EQ(library.command({"dlp", "5", "0", "abc,tmp"}), 0);
-        EXPECT_EQ(library.command({"dlp", "4", "0", std::to_string(getpid()), opened.path()}), 0);
+        EXPECT_EQ(library.command({"6", "100", "2"}), 0);
+        EXPECT_EQ(library.command({"5", "0", "abc,tmp"}), 0);
+        EXPECT_EQ(library.command({"4", "0", std::to_string(getpid()), opened}), 0);
         EXPECT_TRUE(library.find<bool(unsigned long, int)>("_Z20putPendingInodeValuemi")(42, 7));
         auto isNewFileCase =
                 library.find<bool(MapEntry, char*, long, int)>("_Z13isNewFileCase8MapEntryPcli");
         long now = time(nullptr);
-        isNewFileCase(MapEntry{getpid(), "pdf", 2000000000, now}, opened.path().data(), now,
-                      getpid());
-        isNewFileCase(MapEntry{fileManager.pid(), "pdf", 2000000000, now}, opened.path().data(),
-                      now, fileManager.pid());
+        isNewFileCase(MapEntry{getpid(), "pdf", 2000000000, now}, opened.data(), now, getpid());
+        isNewFileCase(MapEntry{fileManager.pid(), "pdf", 2000000000, now}, opened.data(), now,
+                      fileManager.pid());
 
         // Everything recorded went into the library's copy, none into the test's own.
         EXPECT_EQ(library.auditLogState(), 2);
@@ -183,3 +148,4 @@ TEST(ProcessMapStateTest, ReloadingTheSharedLibraryForgetsEverything) {
 }
 
 }  // namespace
+}  // namespace dlp::test

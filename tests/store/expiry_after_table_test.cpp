@@ -1,12 +1,7 @@
 #include <dlp_sdk/expiry_after_table.h>
-
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <linux/magic.h>
-#include <sqlite3.h>
 #include <sys/stat.h>
-#include <sys/statfs.h>
-#include <sys/syscall.h>
 #include <unistd.h>
 
 #include <atomic>
@@ -16,34 +11,23 @@
 #include <cstdlib>
 #include <ctime>
 #include <fstream>
-#include <functional>
 #include <mutex>
 #include <string>
 #include <thread>
-#include <utility>
-#include <vector>
 
-#include "primitives/library_lock.h"
+#include "support/duration_database.h"
+#include "support/library_lock_probe.h"
 #include "support/log_capture.h"
 
+namespace dlp::test {
 namespace {
 
-using dlp::test::kError;
-using dlp::test::kMainBuffer;
-using dlp::test::LogCapture;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::Pair;
 
-constexpr const char* kUsersDirectory = "/data/system/users";
 constexpr const char* kDatabaseDirectory = "/data/system/users/dlp";
-constexpr const char* kDatabasePath = "/data/system/users/dlp/dlpinfo.db";
-
-// The database path is fixed: outside the sandbox's private tmpfs it would be the host's /data.
-bool insideSandbox() {
-    struct statfs info {};
-    return statfs(kUsersDirectory, &info) == 0 && info.f_type == TMPFS_MAGIC;
-}
+const LogRecord kNoId = mainError("DLP_LIBEPM : get_time : No id in the list\n");
 
 bool exists(const char* path) {
     struct stat info {};
@@ -65,93 +49,22 @@ void removeDatabase() {
     rmdir(kDatabaseDirectory);
 }
 
-// A connection of the test's own, next to the library's.
-class Database {
-  public:
-    explicit Database(int flags = SQLITE_OPEN_READWRITE) {
-        EXPECT_EQ(sqlite3_open_v2(kDatabasePath, &handle_, flags, nullptr), SQLITE_OK);
-    }
-    ~Database() { sqlite3_close(handle_); }
-    Database(const Database&) = delete;
-    Database& operator=(const Database&) = delete;
-
-    int execute(const std::string& sql) {
-        return sqlite3_exec(handle_, sql.c_str(), nullptr, nullptr, nullptr);
-    }
-
-    // (Id, Time) of every row, in table order; `where` narrows them.
-    std::vector<std::pair<int, int>> rows(const std::string& where = "") {
-        std::vector<std::pair<int, int>> found;
-        sqlite3_stmt* statement = nullptr;
-        std::string sql = "SELECT Id, Time FROM dlpInfo " + where;
-        EXPECT_EQ(sqlite3_prepare_v2(handle_, sql.c_str(), -1, &statement, nullptr), SQLITE_OK)
-                << sqlite3_errmsg(handle_);
-        while (statement != nullptr && sqlite3_step(statement) == SQLITE_ROW) {
-            found.emplace_back(sqlite3_column_int(statement, 0), sqlite3_column_int(statement, 1));
-        }
-        sqlite3_finalize(statement);
-        return found;
-    }
-    std::vector<std::pair<int, int>> rowsOf(int id) {
-        return rows("WHERE Id = " + std::to_string(id));
-    }
-
-    bool hasTable(const std::string& name) {
-        sqlite3_stmt* statement = nullptr;
-        sqlite3_prepare_v2(handle_, "SELECT 1 FROM sqlite_master WHERE type = 'table' AND name = ?",
-                           -1, &statement, nullptr);
-        sqlite3_bind_text(statement, 1, name.c_str(), -1, SQLITE_TRANSIENT);
-        bool found = sqlite3_step(statement) == SQLITE_ROW;
-        sqlite3_finalize(statement);
-        return found;
-    }
-
-  private:
-    sqlite3* handle_ = nullptr;
-};
-
 void createTable() {
     mkdir(kDatabaseDirectory, 0700);
-    Database database(SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE);
+    DurationDatabase database(SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE);
     ASSERT_EQ(database.execute("CREATE TABLE IF NOT EXISTS dlpInfo(Id INT, Time INT);"), SQLITE_OK);
 }
 
-std::string notInTable(int id, int time) {
-    return "DLP_LIBEPM : set_time : id : " + std::to_string(id) +
-           ", It is not in the table. add time as " + std::to_string(time) + "\n";
+LogRecord notInTableMessage(int id, int time) {
+    return mainError("DLP_LIBEPM : set_time : id : " + std::to_string(id) +
+                     ", It is not in the table. add time as " + std::to_string(time) + "\n");
 }
-
-// Runs `call` on another thread while this one holds the library lock, and `whileHeld` here once
-// that thread sleeps on a futex. True when the call waited for the lock instead of finishing.
-bool waitsForLibraryLock(
-        const std::function<void()>& call, const std::function<void()>& whileHeld = [] {}) {
-    auto lock = dlp::lockLibraryState();
-    std::atomic<bool> started{false}, finished{false};
-    char task[64] = {};
-    std::thread caller([&] {
-        readlink("/proc/thread-self", task, sizeof(task) - 1);
-        started = true;
-        call();
-        finished = true;
-    });
-    while (!started) std::this_thread::yield();
-    // No clock: the caller either finishes or sleeps in the kernel on the held lock.
-    const std::string futex = std::to_string(SYS_futex);
-    std::string syscall;
-    while (!finished && syscall != futex) {
-        std::this_thread::yield();
-        std::ifstream status(std::string("/proc/") + task + "/syscall");
-        if (!status) {
-            ADD_FAILURE() << "cannot watch thread " << task;
-            break;
-        }
-        status >> syscall;
-    }
-    bool waited = !finished;
-    if (waited) whileHeld();
-    lock.unlock();
-    caller.join();
-    return waited;
+LogRecord getFailedMessage(int id) {
+    return mainError("DLP_LOG : get id : " + std::to_string(id) + " is fail\n");
+}
+LogRecord lockedMessage(const std::string& caller) {
+    return mainError("DLP_LIBEPM : " + caller +
+                     " : Failed to execute statement: database is locked\n");
 }
 
 // Ends a death-test child, whose own failures gtest does not print: they go to stderr instead.
@@ -168,33 +81,7 @@ bool waitsForLibraryLock(
 
 class ExpiryAfterTableTest : public ::testing::Test {
   protected:
-    void SetUp() override {
-        if (!insideSandbox()) GTEST_SKIP() << "needs the private /data of tools/dlp-sandbox";
-    }
-
-    // Texts of the messages since the last call; every store message is an error on the main
-    // buffer.
-    std::vector<std::string> takeMessages() {
-        std::vector<std::string> texts;
-        for (const dlp::test::LogRecord& record : log_.records()) {
-            EXPECT_EQ(record.buffer, kMainBuffer) << record.text;
-            EXPECT_EQ(record.priority, kError) << record.text;
-            texts.push_back(record.text);
-        }
-        log_.clear();
-        return texts;
-    }
-
-    void expectNoDuration(int id) {
-        takeMessages();
-        const std::string noId = "DLP_LIBEPM : get_time : No id in the list\n";
-        EXPECT_EQ(get_time(id), -1);
-        EXPECT_THAT(takeMessages(), ElementsAre(noId));
-        EXPECT_EQ(get_expiryAfter_time(id), 1);
-        EXPECT_THAT(takeMessages(),
-                    ElementsAre(noId, "DLP_LOG : get id : " + std::to_string(id) + " is fail\n"));
-        expectAdminExpiry(id, 1);
-    }
+    void SetUp() override { SKIP_UNLESS_DATABASE_IS_THROWAWAY(); }
 
     LogCapture log_;
 };
@@ -212,16 +99,16 @@ TEST_F(ExpiryAfterTableTest, CreatesMissingDirectoryFileAndTable) {
     ASSERT_EQ(stat(kDatabaseDirectory, &info), 0);
     EXPECT_TRUE(S_ISDIR(info.st_mode));
     {
-        Database database;
+        DurationDatabase database;
         EXPECT_TRUE(database.hasTable("dlpInfo"));
         EXPECT_THAT(database.rows(), IsEmpty());
     }
-    EXPECT_THAT(takeMessages(), IsEmpty());
+    expectRecords(log_, {});
 
     removeDatabase();
     EXPECT_EQ(set_time(101, 3600), 0);
-    EXPECT_THAT(takeMessages(), ElementsAre(notInTable(101, 3600)));
-    Database database;
+    expectRecords(log_, {notInTableMessage(101, 3600)});
+    DurationDatabase database;
     EXPECT_THAT(database.rows(), ElementsAre(Pair(101, 3600)));
 }
 
@@ -235,44 +122,42 @@ TEST_F(ExpiryAfterTableTest, SetTimeAddsTableMissingFromExistingFile) {
     EXPECT_EQ(content, "not a database");
     ASSERT_EQ(unlink(kDatabasePath), 0);
     {
-        Database database(SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE);
+        DurationDatabase database(SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE);
         ASSERT_EQ(database.execute("CREATE TABLE other(x INT)"), SQLITE_OK);
     }
 
     EXPECT_EQ(init_table(), 0);
-    EXPECT_FALSE(Database().hasTable("dlpInfo"));
+    EXPECT_FALSE(DurationDatabase().hasTable("dlpInfo"));
     EXPECT_EQ(get_time(102), -1);
-    EXPECT_THAT(takeMessages(),
-                ElementsAre("DLP_LIBEPM : get_time : Failed to execute statement: no such table: "
-                            "dlpInfo\n",
-                            "DLP_LIBEPM : get_time : No id in the list\n"));
+    expectRecords(log_, {mainError("DLP_LIBEPM : get_time : Failed to execute statement: no such "
+                                   "table: dlpInfo\n"),
+                         kNoId});
 
     EXPECT_EQ(set_time(102, 77), 0);
-    EXPECT_THAT(takeMessages(), ElementsAre(notInTable(102, 77)));
-    Database database;
+    expectRecords(log_, {notInTableMessage(102, 77)});
+    DurationDatabase database;
     EXPECT_THAT(database.rows(), ElementsAre(Pair(102, 77)));
     EXPECT_TRUE(database.hasTable("other"));
 }
 
 TEST_F(ExpiryAfterTableTest, SetTimeUpdatesPresentRow) {
     EXPECT_EQ(set_time(103, 10), 0);
-    EXPECT_THAT(takeMessages(), ElementsAre(notInTable(103, 10)));
     EXPECT_EQ(set_time(103, 20), 0);
-    EXPECT_THAT(takeMessages(), IsEmpty());
-    Database database;
+    expectRecords(log_, {notInTableMessage(103, 10)});
+    DurationDatabase database;
     EXPECT_THAT(database.rowsOf(103), ElementsAre(Pair(103, 20)));
     EXPECT_EQ(get_time(103), 20);
 
     // Written by another process: the row decides, not this process's empty cache slot.
     ASSERT_EQ(database.execute("INSERT INTO dlpInfo VALUES(104, 5)"), SQLITE_OK);
     EXPECT_EQ(set_time(104, 6), 0);
-    EXPECT_THAT(takeMessages(), IsEmpty());
+    expectRecords(log_, {});
     EXPECT_THAT(database.rowsOf(104), ElementsAre(Pair(104, 6)));
 }
 
 TEST_F(ExpiryAfterTableTest, LockedDatabaseFailsAtOnce) {
     createTable();
-    Database holder;
+    DurationDatabase holder;
     ASSERT_EQ(holder.execute("BEGIN EXCLUSIVE"), SQLITE_OK);
     // Releases the lock when told to, or on its own long after any call that did not wait for it.
     std::mutex releaseMutex;
@@ -287,9 +172,7 @@ TEST_F(ExpiryAfterTableTest, LockedDatabaseFailsAtOnce) {
     });
 
     int setResult = set_time(105, 50);
-    std::vector<std::string> setMessages = takeMessages();
     int getResult = get_time(106);
-    std::vector<std::string> getMessages = takeMessages();
     int cachedResult = get_time(105);
     bool lockStillHeld = !released;
     {
@@ -301,44 +184,36 @@ TEST_F(ExpiryAfterTableTest, LockedDatabaseFailsAtOnce) {
 
     EXPECT_TRUE(lockStillHeld) << "the calls waited for the lock";
     EXPECT_EQ(setResult, 1);
-    EXPECT_THAT(setMessages,
-                ElementsAre("DLP_LIBEPM : set_time : Failed to execute statement: database is "
-                            "locked\n",
-                            notInTable(105, 50),
-                            "DLP_LIBEPM : set_time : SQL error: database is locked\n"));
     EXPECT_EQ(getResult, -1);
-    EXPECT_THAT(getMessages,
-                ElementsAre("DLP_LIBEPM : get_time : Failed to execute statement: database is "
-                            "locked\n",
-                            "DLP_LIBEPM : get_time : No id in the list\n"));
     // The failed write still reached the cache.
     EXPECT_EQ(cachedResult, 50);
-    EXPECT_THAT(takeMessages(), IsEmpty());
-    EXPECT_THAT(Database().rows("WHERE Id IN (105, 106)"), IsEmpty());
+    expectRecords(log_, {lockedMessage("set_time"), notInTableMessage(105, 50),
+                         mainError("DLP_LIBEPM : set_time : SQL error: database is locked\n"),
+                         lockedMessage("get_time"), kNoId});
+    EXPECT_THAT(DurationDatabase().rows("WHERE Id IN (105, 106)"), IsEmpty());
 }
 
 TEST_F(ExpiryAfterTableTest, CacheServesValueAfterDatabaseDeleted) {
     ASSERT_EQ(set_time(107, 900), 0);
     removeDatabase();
-    takeMessages();
+    log_.clear();
 
     EXPECT_EQ(get_time(107), 900);
     EXPECT_EQ(get_expiryAfter_time(107), 900);
     expectAdminExpiry(107, 900);
-    EXPECT_THAT(takeMessages(), IsEmpty());
+    expectRecords(log_, {});
     EXPECT_FALSE(exists(kDatabaseDirectory));
 }
 
 TEST_F(ExpiryAfterTableTest, StoredMinusOneReadsAsFailure) {
     EXPECT_EQ(set_expiryAfter_time(108, -1), 0);
-    Database database;
+    DurationDatabase database;
     EXPECT_THAT(database.rowsOf(108), ElementsAre(Pair(108, -1)));
-    takeMessages();
+    log_.clear();
 
     EXPECT_EQ(get_time(108), -1);
-    EXPECT_THAT(takeMessages(), IsEmpty());
     EXPECT_EQ(get_expiryAfter_time(108), 1);
-    EXPECT_THAT(takeMessages(), ElementsAre("DLP_LOG : get id : 108 is fail\n"));
+    expectRecords(log_, {getFailedMessage(108)});
 
     // -1 marks an empty slot, so the table is read again every time.
     ASSERT_EQ(database.execute("UPDATE dlpInfo SET Time = 42 WHERE Id = 108"), SQLITE_OK);
@@ -347,21 +222,20 @@ TEST_F(ExpiryAfterTableTest, StoredMinusOneReadsAsFailure) {
 
 TEST_F(ExpiryAfterTableTest, StoredZeroIsADuration) {
     EXPECT_EQ(set_time(109, 0), 0);
-    Database database;
+    DurationDatabase database;
     EXPECT_THAT(database.rowsOf(109), ElementsAre(Pair(109, 0)));
-    takeMessages();
+    log_.clear();
 
     EXPECT_EQ(get_time(109), 0);
     EXPECT_EQ(get_expiryAfter_time(109), 0);
     expectAdminExpiry(109, 0);
-    EXPECT_THAT(takeMessages(), IsEmpty());
 
     // A 0 read from the table is cached like one written here.
     ASSERT_EQ(database.execute("INSERT INTO dlpInfo VALUES(110, 0)"), SQLITE_OK);
     EXPECT_EQ(get_time(110), 0);
     ASSERT_EQ(database.execute("UPDATE dlpInfo SET Time = 7 WHERE Id = 110"), SQLITE_OK);
     EXPECT_EQ(get_time(110), 0);
-    EXPECT_THAT(takeMessages(), IsEmpty());
+    expectRecords(log_, {});
 }
 
 TEST_F(ExpiryAfterTableTest, AcceptsOnlyContainerIds100To199) {
@@ -369,28 +243,26 @@ TEST_F(ExpiryAfterTableTest, AcceptsOnlyContainerIds100To199) {
     EXPECT_EQ(set_time(200, 5), 1);
     EXPECT_EQ(get_time(99), -1);
     EXPECT_EQ(get_time(200), -1);
-    EXPECT_THAT(takeMessages(),
-                ElementsAre("DLP_LIBEPM : set_time : set_time error : id : 99, index : -1\n",
-                            "DLP_LIBEPM : set_time : set_time error : id : 200, index : 100\n",
-                            "DLP_LIBEPM : get_time : error : id : 99, index : -1\n",
-                            "DLP_LIBEPM : get_time : error : id : 200, index : 100\n"));
-
     EXPECT_EQ(set_expiryAfter_time(200, 5), 1);
     EXPECT_EQ(get_expiryAfter_time(99), 1);
-    EXPECT_THAT(takeMessages(),
-                ElementsAre("DLP_LIBEPM : set_time : set_time error : id : 200, index : 100\n",
-                            "DLP_LOG : set id : 200, time : 5 is fail\n",
-                            "DLP_LIBEPM : get_time : error : id : 99, index : -1\n",
-                            "DLP_LOG : get id : 99 is fail\n"));
+    const LogRecord set99 =
+            mainError("DLP_LIBEPM : set_time : set_time error : id : 99, index : -1\n");
+    const LogRecord set200 =
+            mainError("DLP_LIBEPM : set_time : set_time error : id : 200, index : 100\n");
+    const LogRecord get99 = mainError("DLP_LIBEPM : get_time : error : id : 99, index : -1\n");
+    expectRecords(log_, {set99, set200, get99,
+                         mainError("DLP_LIBEPM : get_time : error : id : 200, index : 100\n"),
+                         set200, mainError("DLP_LOG : set id : 200, time : 5 is fail\n"), get99,
+                         getFailedMessage(99)});
     expectAdminExpiry(200, 1);
-    takeMessages();
+    log_.clear();
 
     EXPECT_EQ(set_time(100, 1000), 0);
     EXPECT_EQ(set_expiryAfter_time(199, 1999), 0);
-    EXPECT_THAT(takeMessages(), ElementsAre(notInTable(100, 1000), notInTable(199, 1999)));
+    expectRecords(log_, {notInTableMessage(100, 1000), notInTableMessage(199, 1999)});
     EXPECT_EQ(get_time(100), 1000);
     EXPECT_EQ(get_expiryAfter_time(199), 1999);
-    EXPECT_THAT(Database().rows("WHERE Id IN (99, 100, 199, 200) ORDER BY Id"),
+    EXPECT_THAT(DurationDatabase().rows("WHERE Id IN (99, 100, 199, 200) ORDER BY Id"),
                 ElementsAre(Pair(100, 1000), Pair(199, 1999)));
 }
 
@@ -400,7 +272,10 @@ TEST_F(ExpiryAfterTableTest, NeverWrittenIdReadsAsOneSecondInFreshProcess) {
     GTEST_FLAG_SET(death_test_style, "threadsafe");
     EXPECT_EXIT(
             {
-                expectNoDuration(150);
+                EXPECT_EQ(get_time(150), -1);
+                EXPECT_EQ(get_expiryAfter_time(150), 1);
+                expectRecords(log_, {kNoId, kNoId, getFailedMessage(150)});
+                expectAdminExpiry(150, 1);
                 exitReportingFailures();
             },
             ::testing::ExitedWithCode(0), "");
@@ -427,3 +302,4 @@ TEST_F(ExpiryAfterTableTest, EntryPointsWaitForLibraryLock) {
 }
 
 }  // namespace
+}  // namespace dlp::test

@@ -1,6 +1,7 @@
 #include "support/log_capture.h"
 
 #include <android/log.h>
+#include <gtest/gtest.h>
 
 #include <mutex>
 
@@ -17,6 +18,16 @@ void captureMessage(const __android_logger_data* data, const char* message) {
 }
 
 }  // namespace
+
+bool operator==(const LogRecord& left, const LogRecord& right) {
+    return left.buffer == right.buffer && left.priority == right.priority &&
+           left.text == right.text;
+}
+
+void PrintTo(const LogRecord& record, std::ostream* out) {
+    *out << "{buffer " << record.buffer << ", priority " << record.priority << ", "
+         << ::testing::PrintToString(record.text) << "}";
+}
 
 LogCapture::LogCapture() {
     clear();
@@ -39,11 +50,9 @@ void LogCapture::clear() {
     captured.clear();
 }
 
-size_t LogCapture::count(int buffer, int priority, const std::string& text) const {
+size_t LogCapture::count(const LogRecord& wanted) const {
     size_t found = 0;
-    for (const LogRecord& record : records()) {
-        if (record.buffer == buffer && record.priority == priority && record.text == text) ++found;
-    }
+    for (const LogRecord& record : records()) found += record == wanted ? 1 : 0;
     return found;
 }
 
@@ -53,6 +62,34 @@ std::vector<LogRecord> LogCapture::matching(const std::string& fragment) const {
         if (record.text.find(fragment) != std::string::npos) found.push_back(record);
     }
     return found;
+}
+
+namespace {
+
+void compareRecords(const std::vector<LogRecord>& actual, const std::vector<LogRecord>& expected,
+                    const char* file, int line) {
+    if (actual == expected) return;
+    auto list = [](const std::vector<LogRecord>& records) {
+        std::string text;
+        for (const LogRecord& record : records) text += "\n    " + ::testing::PrintToString(record);
+        return text;
+    };
+    ADD_FAILURE_AT(file, line) << "log records:" << list(actual)
+                               << "\n  expected:" << list(expected);
+}
+
+}  // namespace
+
+void expectRecords(LogCapture& log, const std::vector<LogRecord>& expected, const char* file,
+                   int line) {
+    compareRecords(log.records(), expected, file, line);
+    log.clear();
+}
+
+void expectRecords(LogCapture& log, const std::string& fragment,
+                   const std::vector<LogRecord>& expected, const char* file, int line) {
+    compareRecords(log.matching(fragment), expected, file, line);
+    log.clear();
 }
 
 }  // namespace dlp::test
