@@ -3,7 +3,10 @@
 #include <android/log.h>
 #include <gtest/gtest.h>
 
+#include <cerrno>
+#include <cstring>
 #include <mutex>
+#include <utility>
 
 namespace dlp::test {
 
@@ -11,10 +14,20 @@ namespace {
 
 std::mutex capturedMutex;
 std::vector<LogRecord> captured;
+// The library logs with a null tag, which liblog replaces by the program's name.
+std::vector<std::string> otherTags;
 
 void captureMessage(const __android_logger_data* data, const char* message) {
     std::lock_guard<std::mutex> guard(capturedMutex);
     captured.push_back(LogRecord{data->buffer_id, data->priority, message});
+    if (data->tag == nullptr || std::strcmp(data->tag, program_invocation_short_name) != 0) {
+        otherTags.push_back(data->tag == nullptr ? "(null)" : data->tag);
+    }
+}
+
+std::vector<std::string> takeOtherTags() {
+    std::lock_guard<std::mutex> guard(capturedMutex);
+    return std::exchange(otherTags, {});
 }
 
 }  // namespace
@@ -48,6 +61,7 @@ std::vector<LogRecord> LogCapture::records() const {
 void LogCapture::clear() {
     std::lock_guard<std::mutex> guard(capturedMutex);
     captured.clear();
+    otherTags.clear();
 }
 
 size_t LogCapture::count(const LogRecord& wanted) const {
@@ -68,6 +82,9 @@ namespace {
 
 void compareRecords(const std::vector<LogRecord>& actual, const std::vector<LogRecord>& expected,
                     const char* file, int line) {
+    for (const std::string& tag : takeOtherTags()) {
+        ADD_FAILURE_AT(file, line) << "a message was logged with the tag " << tag;
+    }
     if (actual == expected) return;
     auto list = [](const std::vector<LogRecord>& records) {
         std::string text;
