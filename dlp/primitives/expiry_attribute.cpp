@@ -29,37 +29,33 @@ long decodeExpiry(const unsigned char (&value)[kExpiryValueSize]) {
 }  // namespace
 
 int set_dlp_file_expiry_time(const char* path, long expiry) {
-    if (path == nullptr) {
-        DLP_PRINT_ERROR("DLP_LIBDLP :  Error: setxattr(%s, setxattr error - %d, %d, %s\n", "(null)",
-                        -1, EINVAL, strerror(EINVAL));
+    // A null path fails like a call that the kernel refused.
+    int result = -1;
+    if (path != nullptr) {
+        unsigned char value[kExpiryValueSize];
+        encodeExpiry(expiry, value);
+        result = setxattr(path, kExpiryAttribute, value, sizeof(value), 0);
+    } else {
         errno = EINVAL;
-        return -1;
     }
-    unsigned char value[kExpiryValueSize];
-    encodeExpiry(expiry, value);
-    int result = setxattr(path, kExpiryAttribute, value, sizeof(value), 0);
     if (result == 0) {
         DLP_PRINT_ERROR("DLP_LIBDLP :  set xattr is successful!!");
         return 0;
     }
     int error = errno;
-    DLP_PRINT_ERROR("DLP_LIBDLP :  Error: setxattr(%s, setxattr error - %d, %d, %s\n", path, result,
-                    error, strerror(error));
+    DLP_PRINT_ERROR("DLP_LIBDLP :  Error: setxattr(%s, setxattr error - %d, %d, %s\n",
+                    path != nullptr ? path : "(null)", result, error, strerror(error));
     return -1;
 }
 
 long get_dlp_file_expiry_time(const char* path) {
-    if (path == nullptr) {
-        DLP_PRINT_ERROR(
-                "DLP_LIBDLP :  in get_dlp_file_expiry_time Error: getxattr(%s, getxattr error - "
-                "%d, "
-                "%d, %s\n",
-                "(null)", -1, EINVAL, strerror(EINVAL));
-        errno = EINVAL;
-        return -1;
-    }
     unsigned char value[kExpiryValueSize];
-    int result = static_cast<int>(getxattr(path, kExpiryAttribute, value, sizeof(value)));
+    int result = -1;
+    if (path != nullptr) {
+        result = static_cast<int>(getxattr(path, kExpiryAttribute, value, sizeof(value)));
+    } else {
+        errno = EINVAL;
+    }
     int error = errno;
     if (result == -1 && error == ENODATA) {
         DLP_PRINT_ERROR("DLP_LIBDLP :   in get_dlp_file_expiry_time normal file (%s)\n", path);
@@ -68,9 +64,8 @@ long get_dlp_file_expiry_time(const char* path) {
     if (result != static_cast<int>(kExpiryValueSize)) {
         DLP_PRINT_ERROR(
                 "DLP_LIBDLP :  in get_dlp_file_expiry_time Error: getxattr(%s, getxattr error - "
-                "%d, "
-                "%d, %s\n",
-                path, result, error, strerror(error));
+                "%d, %d, %s\n",
+                path != nullptr ? path : "(null)", result, error, strerror(error));
         return -1;
     }
     long expiry = decodeExpiry(value);
