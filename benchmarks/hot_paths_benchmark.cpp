@@ -8,16 +8,13 @@
 #include <android/log.h>
 #include <benchmark/benchmark.h>
 #include <malloc.h>
-#include <signal.h>
-#include <spawn.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <cstdio>
 #include <ctime>
 #include <string>
 
-extern char** environ;
+#include "support/child_process.h"
 
 namespace {
 
@@ -39,22 +36,6 @@ class ScratchFile {
     std::string path_;
 };
 
-class SleepingApp {
-  public:
-    explicit SleepingApp(const char* name) {
-        char* argv[] = {const_cast<char*>(name), const_cast<char*>("600"), nullptr};
-        posix_spawn(&pid_, "/bin/sleep", nullptr, nullptr, argv, environ);
-    }
-    ~SleepingApp() {
-        kill(pid_, SIGKILL);
-        waitpid(pid_, nullptr, 0);
-    }
-    int pid() const { return pid_; }
-
-  private:
-    pid_t pid_ = -1;
-};
-
 void FileOpenOfProtectedFile(benchmark::State& state) {
     ScratchFile file("protected.pdf");
     set_dlp_file_expiry_time(file.path(), time(nullptr) + 3600);
@@ -71,7 +52,7 @@ BENCHMARK(FileOpenOfUnprotectedFile);
 
 // A whitelisted app is named from /proc on every create; the inherited expiry is written.
 void NewFileInheritedByWhitelistedApp(benchmark::State& state) {
-    SleepingApp office("com.hancom.office.editor");
+    dlp::test::ChildProcess office("com.hancom.office.editor");
     ScratchFile opened("opened.docx");
     ScratchFile created("created.doc");
     set_dlp_file_expiry_time(opened.path(), time(nullptr) + 3600);
@@ -85,7 +66,7 @@ BENCHMARK(NewFileInheritedByWhitelistedApp);
 
 // A rejected app is answered from the reject list; the duration comes from the cache.
 void NewFileOfOtherApp(benchmark::State& state) {
-    SleepingApp other("org.example.viewer");
+    dlp::test::ChildProcess other("org.example.viewer");
     ScratchFile opened("viewed.pdf");
     ScratchFile created("saved.pdf");
     set_expiryAfter_time(kContainerId, 86400);
