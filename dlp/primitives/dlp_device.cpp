@@ -55,14 +55,15 @@ int set_dlp_extension(int id, const char* extensions) {
     }
     dlp::UniqueFd device(openDevice());
     if (!device.ok()) return -1;
-    if (strlen(extensions) > kLongestExtensionText) {
+    size_t length = strlen(extensions);
+    if (length > kLongestExtensionText) {
         DLP_PRINT_ERROR("DLP_LIBDLP :  Extension length exceeds defined length");
         return -1;
     }
     // Zero-filled beyond the text, so the device always finds a terminated text.
     ExtensionRecord record = {};
     record.id = id;
-    memcpy(record.text, extensions, strlen(extensions));
+    memcpy(record.text, extensions, length);
     if (ioctl(device.get(), DLP_EXTENSION_SET, &record) < 0) {
         DLP_PRINT_ERROR("DLP_LIBDLP :  DLP_EXTENSION_SET failed: %s\n", strerror(errno));
         return -1;
