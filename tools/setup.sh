@@ -4,7 +4,7 @@ set -euo pipefail
 
 packages=(
   build-essential cmake pkg-config clang-format
-  android-liblog-dev libsqlite3-dev sqlite3
+  android-liblog-dev android-libbase-dev libsqlite3-dev sqlite3
   libgtest-dev libgmock-dev libbenchmark-dev
   libfuse3-dev fuse3 faketime util-linux mount
   openjdk-17-jdk-headless junit5

@@ -1,18 +1,17 @@
-#include <dlp_sdk/expiry_after_table.h>
 #include <dlp_sdk/expiry_attribute.h>
-#include <dlp_sdk/file_open_tracking.h>
 #include <dlp_sdk/new_file_expiry.h>
 #include <dlp_sdk/process_name.h>
 
 #include <cerrno>
 #include <cstdint>
 #include <cstring>
-#include <ctime>
 
-#include "decisions/path_extension.h"
 #include "primitives/library_lock.h"
+#include "primitives/path_extension.h"
 #include "primitives/platform_log.h"
-#include "processmap/hash_map.h"
+#include "processmap/entry_store.h"
+#include "processmap/process_map_internal.h"
+#include "store/expiry_after_table.h"
 
 namespace {
 
@@ -31,7 +30,7 @@ bool isExpiryAlreadySet(const char* path, long now, const char* caseName,
             caseName, static_cast<int>(now), static_cast<int>(current),
             static_cast<int>(difference));
     // Unsigned on purpose: an expiry already in the past counts as set as well.
-    if (current != -1 && static_cast<uint64_t>(difference) >= kFreshExpiryWindow) {
+    if (current != dlp::kNoExpiry && static_cast<uint64_t>(difference) >= kFreshExpiryWindow) {
         DLP_SYSTEM_DEBUG(
                 "DLP_LIBDLP : <setExpiryforFile> %s -- DLP expiry time is already set by Filbrook "
                 "ignoring the case",
@@ -56,7 +55,7 @@ int stampZipCopy(int pid, const char* path, long now) {
     if (isExpiryAlreadySet(path, now, "support 2.7 Zip copy", "support for 2.7 zip")) return 0;
     MapEntry last;
     {
-        auto lock = dlp::lockLibraryState();
+        dlp::LibraryLockGuard guard;
         last = mProcessMap.getLastOpenedEntry(pid);
     }
     long expiry;
@@ -73,6 +72,17 @@ int stampZipCopy(int pid, const char* path, long now) {
     // The attribute primitive reports its own failure; a zip copy always succeeds.
     set_dlp_file_expiry_time(path, expiry);
     return 0;
+}
+
+bool isNewFileCaseLocked(MapEntry entry, long currentTime, int pid) REQUIRES(dlp::libraryLock) {
+    long openTime = entry.value_opentime;
+    if (mProcessMap.isRejectedPid(pid, std::move(entry))) {
+        DLP_SYSTEM_DEBUG(
+                "DLP_LIBDLP : <isNewFileCase> pid[%d] passed is in reject list do new file case",
+                pid);
+        return true;
+    }
+    return currentTime - openTime > kInheritableAge;
 }
 
 }  // namespace
@@ -92,16 +102,20 @@ int setExpiryforFile(int pid, char* path, int containerId) {
     MapEntry related;
     bool inherits = false;
     bool fileManagerCase = false;
+    long newFileExpiry = 0;
     {
-        auto lock = dlp::lockLibraryState();
+        dlp::LibraryLockGuard guard;
         related = mProcessMap.get(pid, extension);
-        if (related.value_pid == pid && related.value_expiry != -1) {
+        if (related.value_pid == pid && related.value_expiry != dlp::kNoExpiry) {
             MapEntry candidate = related;
             candidate.value_pid = pid;
-            inherits = !isNewFileCase(std::move(candidate), path, callTime, pid);
+            inherits = !isNewFileCaseLocked(std::move(candidate), callTime, pid);
             // Read after the classification, which may just have recorded the file manager.
-            fileManagerCase =
-                    mProcessMap.mFileManagerPid == pid || related.value_extension == "unzip";
+            fileManagerCase = mProcessMap.mFileManagerPid == pid ||
+                              related.value_extension == dlp::kUnpackedFromZipExtension;
+        }
+        if (!inherits) {
+            newFileExpiry = lookupTime + static_cast<long>(dlp::expiryAfterTimeLocked(containerId));
         }
     }
 
@@ -116,36 +130,16 @@ int setExpiryforFile(int pid, char* path, int containerId) {
         return writeExpiry(path, related.value_expiry);
     }
 
-    long expiry = lookupTime + static_cast<long>(get_expiryAfter_time(containerId));
     DLP_SYSTEM_DEBUG(
             "DLP_LIBDLP : <setExpiryforFile> NEWFILE CASE. pid[%d], file_path[%s]. Set IT admin's "
             "expiry[%ld]",
-            pid, path, expiry);
-    int result = writeExpiry(path, expiry);
+            pid, path, newFileExpiry);
+    int result = writeExpiry(path, newFileExpiry);
     if (result == 0) DLP_SYSTEM_DEBUG("DLP_LIBDLP : <setExpiryforFile> setxattr OK\n");
     return result;
 }
 
 bool isNewFileCase(MapEntry entry, char* /*path*/, long currentTime, int pid) {
-    auto lock = dlp::lockLibraryState();
-    long openTime = entry.value_opentime;
-    if (mProcessMap.isRejectedPid(pid, std::move(entry))) {
-        DLP_SYSTEM_DEBUG(
-                "DLP_LIBDLP : <isNewFileCase> pid[%d] passed is in reject list do new file case",
-                pid);
-        return true;
-    }
-    return currentTime - openTime > kInheritableAge;
-}
-
-long getEndOfDay() {
-    time_t now = time(nullptr);
-    tm local{};
-    localtime_r(&now, &local);
-    local.tm_hour = 23;
-    local.tm_min = 59;
-    local.tm_sec = 59;
-    // Let mktime decide daylight saving for 23:59:59, which may differ from now's.
-    local.tm_isdst = -1;
-    return static_cast<long>(mktime(&local));
+    dlp::LibraryLockGuard guard;
+    return isNewFileCaseLocked(std::move(entry), currentTime, pid);
 }

@@ -1,5 +1,6 @@
 #include <dlp_sdk/dlp_device.h>
 
+#include <android-base/unique_fd.h>
 #include <fcntl.h>
 #include <sys/ioctl.h>
 
@@ -8,7 +9,6 @@
 #include <cstring>
 
 #include "primitives/platform_log.h"
-#include "primitives/unique_fd.h"
 
 namespace {
 
@@ -31,16 +31,16 @@ static_assert(DLP_EXTENSION_SET == 0x43F07803, "request number fixed by the driv
 
 int openDevice() {
     int fd = open(kDevicePath, O_RDONLY | O_CLOEXEC);
-    if (fd < 0) DLP_PRINT_ERROR("DLP_LIBDLP :  Can't open device file: %s\n", kDevicePath);
+    if (fd < 0) DLP_PRIMITIVE_LOG("DLP_LIBDLP :  Can't open device file: %s\n", kDevicePath);
     return fd;
 }
 
 int sendLockRequest(int id, unsigned long request, const char* requestName) {
-    dlp::UniqueFd device(openDevice());
+    android::base::unique_fd device(openDevice());
     if (!device.ok()) return -1;
     int32_t argument = id;
     if (ioctl(device.get(), request, &argument) < 0) {
-        DLP_PRINT_ERROR("DLP_LIBDLP :  %s failed: %s\n", requestName, strerror(errno));
+        DLP_PRIMITIVE_LOG("DLP_LIBDLP :  %s failed: %s\n", requestName, strerror(errno));
         return -1;
     }
     return 0;
@@ -50,14 +50,14 @@ int sendLockRequest(int id, unsigned long request, const char* requestName) {
 
 int set_dlp_extension(int id, const char* extensions) {
     if (extensions == nullptr) {
-        DLP_PRINT_ERROR("DLP_LIBDLP :  Extension list is null");
+        DLP_PRIMITIVE_LOG("DLP_LIBDLP :  Extension list is null");
         return -1;
     }
-    dlp::UniqueFd device(openDevice());
+    android::base::unique_fd device(openDevice());
     if (!device.ok()) return -1;
     size_t length = strlen(extensions);
     if (length > kLongestExtensionText) {
-        DLP_PRINT_ERROR("DLP_LIBDLP :  Extension length exceeds defined length");
+        DLP_PRIMITIVE_LOG("DLP_LIBDLP :  Extension length exceeds defined length");
         return -1;
     }
     // Zero-filled beyond the text, so the device always finds a terminated text.
@@ -65,18 +65,18 @@ int set_dlp_extension(int id, const char* extensions) {
     record.id = id;
     memcpy(record.text, extensions, length);
     if (ioctl(device.get(), DLP_EXTENSION_SET, &record) < 0) {
-        DLP_PRINT_ERROR("DLP_LIBDLP :  DLP_EXTENSION_SET failed: %s\n", strerror(errno));
+        DLP_PRIMITIVE_LOG("DLP_LIBDLP :  DLP_EXTENSION_SET failed: %s\n", strerror(errno));
         return -1;
     }
     return 0;
 }
 
 int lock_dlp(int id) {
-    DLP_PRINT_ERROR("DLP_LIBDLP :  lock_dlp : for %d\n", id);
+    DLP_PRIMITIVE_LOG("DLP_LIBDLP :  lock_dlp : for %d\n", id);
     return sendLockRequest(id, DLP_LOCK_ENABLE, "DLP_LOCK_ENABLE");
 }
 
 int unlock_dlp(int id) {
-    DLP_PRINT_ERROR("DLP_LIBDLP :  unlock_dlp : for %d\n", id);
+    DLP_PRIMITIVE_LOG("DLP_LIBDLP :  unlock_dlp : for %d\n", id);
     return sendLockRequest(id, DLP_LOCK_DISABLE, "DLP_LOCK_DISABLE");
 }

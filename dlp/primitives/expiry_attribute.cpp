@@ -6,6 +6,7 @@
 #include <cstdint>
 #include <cstring>
 
+#include "primitives/expiry_time.h"
 #include "primitives/platform_log.h"
 
 namespace {
@@ -39,12 +40,12 @@ int set_dlp_file_expiry_time(const char* path, long expiry) {
         errno = EINVAL;
     }
     if (result == 0) {
-        DLP_PRINT_ERROR("DLP_LIBDLP :  set xattr is successful!!");
+        DLP_PRIMITIVE_LOG("DLP_LIBDLP :  set xattr is successful!!");
         return 0;
     }
     int error = errno;
-    DLP_PRINT_ERROR("DLP_LIBDLP :  Error: setxattr(%s, setxattr error - %d, %d, %s\n",
-                    path != nullptr ? path : "(null)", result, error, strerror(error));
+    DLP_PRIMITIVE_LOG("DLP_LIBDLP :  Error: setxattr(%s, setxattr error - %d, %d, %s\n",
+                      path != nullptr ? path : "(null)", result, error, strerror(error));
     return -1;
 }
 
@@ -58,19 +59,19 @@ long get_dlp_file_expiry_time(const char* path) {
     }
     int error = errno;
     if (result == -1 && error == ENODATA) {
-        DLP_PRINT_ERROR("DLP_LIBDLP :   in get_dlp_file_expiry_time normal file (%s)\n", path);
-        return -1;
+        DLP_PRIMITIVE_LOG("DLP_LIBDLP :   in get_dlp_file_expiry_time normal file (%s)\n", path);
+        return dlp::kNoExpiry;
     }
     if (result != static_cast<int>(kExpiryValueSize)) {
-        DLP_PRINT_ERROR(
+        DLP_PRIMITIVE_LOG(
                 "DLP_LIBDLP :  in get_dlp_file_expiry_time Error: getxattr(%s, getxattr error - "
                 "%d, %d, %s\n",
                 path != nullptr ? path : "(null)", result, error, strerror(error));
-        return -1;
+        return dlp::kNoExpiry;
     }
     long expiry = decodeExpiry(value);
-    DLP_PRINT_ERROR("DLP_LIBDLP :  in get_dlp_file_expiry_time getxattr OK: [%ld]\n", expiry);
+    DLP_PRIMITIVE_LOG("DLP_LIBDLP :  in get_dlp_file_expiry_time getxattr OK: [%ld]\n", expiry);
     if (expiry > 0) return expiry;
-    DLP_PRINT_ERROR("DLP_LIBDLP :  dlp expiry time is <= 0 retunring -1");
-    return -1;
+    DLP_PRIMITIVE_LOG("DLP_LIBDLP :  dlp expiry time is <= 0 retunring -1");
+    return dlp::kNoExpiry;
 }

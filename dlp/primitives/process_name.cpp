@@ -1,27 +1,48 @@
 #include <dlp_sdk/process_name.h>
 
+#include <android-base/unique_fd.h>
 #include <fcntl.h>
 #include <unistd.h>
 
-#include <cstdio>
+#include <cstring>
 
 #include "primitives/platform_log.h"
-#include "primitives/unique_fd.h"
+
+namespace {
+
+// One buffer for the path and then the name: a name keeps at most 254 bytes.
+constexpr size_t kProcessNameBufferSize = 255;
+constexpr char kUnreadableName[] = "???";
+
+// "/proc/<pid>/cmdline", built by hand: this runs on every file a whitelisted app creates.
+void formatCommandLinePath(int pid, char (&path)[kProcessNameBufferSize]) {
+    char digits[16];
+    size_t count = 0;
+    // Unsigned, so that the most negative pid has a magnitude as well.
+    unsigned int magnitude = pid < 0 ? 0u - static_cast<unsigned int>(pid) : pid;
+    do {
+        digits[count++] = static_cast<char>('0' + magnitude % 10);
+        magnitude /= 10;
+    } while (magnitude != 0);
+    char* cursor = path;
+    memcpy(cursor, "/proc/", 6);
+    cursor += 6;
+    if (pid < 0) *cursor++ = '-';
+    while (count > 0) *cursor++ = digits[--count];
+    memcpy(cursor, "/cmdline", sizeof("/cmdline"));
+}
+
+}  // namespace
 
 std::string getProcessNameByPid(int pid) {
-    // One buffer for the path and then the name: the name keeps at most 254 bytes.
-    char buffer[255] = {};
-    snprintf(buffer, sizeof(buffer), "/proc/%d/cmdline", pid);
-    dlp::UniqueFd file(open(buffer, O_RDONLY | O_CLOEXEC));
-    if (!file.ok()) {
-        snprintf(buffer, sizeof(buffer), "???");
+    char buffer[kProcessNameBufferSize] = {};
+    formatCommandLinePath(pid, buffer);
+    android::base::unique_fd file(open(buffer, O_RDONLY | O_CLOEXEC));
+    ssize_t length = file.ok() ? read(file.get(), buffer, sizeof(buffer) - 1) : -1;
+    if (length < 0) {
+        memcpy(buffer, kUnreadableName, sizeof(kUnreadableName));
     } else {
-        ssize_t length = read(file.get(), buffer, sizeof(buffer) - 1);
-        if (length < 0) {
-            snprintf(buffer, sizeof(buffer), "???");
-        } else {
-            buffer[length] = '\0';
-        }
+        buffer[length] = '\0';
     }
     std::string name(buffer);
     DLP_SYSTEM_DEBUG("DLP_LIBDLP : <getProcessNameByPid> pid[%d], processName[%s]", pid,

@@ -1,7 +1,10 @@
+#include "processmap/entry_store.h"
+
 #include <dlp_sdk/process_name.h>
 
 #include "primitives/platform_log.h"
-#include "processmap/hash_map.h"
+#include "processmap/extension_rules.h"
+#include "processmap/process_map_internal.h"
 
 bool HashMap::put(int key, MapEntry value) {
     DLP_SYSTEM_DEBUG(
@@ -41,11 +44,11 @@ bool HashMap::put(int key, MapEntry value) {
 MapEntry HashMap::get(int key, std::string extension) {
     DLP_SYSTEM_DEBUG("DLP_LIBDLP : <HashMap::get> key[%d], value.value_extension[%s]", key,
                      extension.c_str());
-    if (isValidExtension(extension) == 0) return emptyMapEntry();
+    if (isValidExtension(extension) == 0) return dlp::emptyMapEntry();
     mMapIterator = mInternalProcessMap.find(key);
     if (mMapIterator == mInternalProcessMap.end()) {
         DLP_SYSTEM_DEBUG("DLP_LIBDLP : <HashMap::get> record with key[%d] not found.", key);
-        return emptyMapEntry();
+        return dlp::emptyMapEntry();
     }
     const std::vector<MapEntry>& entries = mMapIterator->second;
 
@@ -53,7 +56,7 @@ MapEntry HashMap::get(int key, std::string extension) {
     if (entries.back().value_extension == "zip" &&
         getProcessNameByPid(key) == FILE_MANAGER_PACKAGE) {
         MapEntry result = entries.back();
-        result.value_extension = "unzip";
+        result.value_extension = dlp::kUnpackedFromZipExtension;
         DLP_SYSTEM_DEBUG(
                 "DLP_LIBDLP : <HashMap::get> zip file is opened in Filbrook most recently with "
                 "expiry [%d]. Return this.",
@@ -70,8 +73,8 @@ MapEntry HashMap::get(int key, std::string extension) {
         }
     }
 
-    int index = getValidMapEntryIndexForExt(extension, entries);
-    if (index != -2) {
+    int index = dlp::relatedEntryIndex(*this, extension, entries);
+    if (index != dlp::kNoEntryIndex) {
         const MapEntry& result = entries[index];
         DLP_SYSTEM_DEBUG(
                 "DLP_LIBDLP : <HashMap::get> extension not matching with [%s]. returning last "
@@ -82,7 +85,7 @@ MapEntry HashMap::get(int key, std::string extension) {
     }
     DLP_SYSTEM_DEBUG("DLP_LIBDLP : <HashMap::get> record with key[%d] found but ext[%s] not found",
                      key, extension.c_str());
-    return emptyMapEntry();
+    return dlp::emptyMapEntry();
 }
 
 bool HashMap::remove(int key) {
@@ -92,12 +95,12 @@ bool HashMap::remove(int key) {
     // Never left on an erased element.
     mMapIterator = mInternalProcessMap.end();
     mRejectList.erase(key);
-    if (mFileManagerPid == key) mFileManagerPid = -1;
+    if (mFileManagerPid == key) mFileManagerPid = dlp::kNoPid;
     return true;
 }
 
 MapEntry HashMap::getLastOpenedEntry(int pid) {
     mMapIterator = mInternalProcessMap.find(pid);
-    if (mMapIterator == mInternalProcessMap.end()) return emptyMapEntry();
+    if (mMapIterator == mInternalProcessMap.end()) return dlp::emptyMapEntry();
     return mMapIterator->second.back();
 }

@@ -1,8 +1,18 @@
-#include <algorithm>
+#include "processmap/extension_rules.h"
 
-#include "primitives/library_lock.h"
+#include <algorithm>
+#include <utility>
+
 #include "primitives/platform_log.h"
-#include "processmap/hash_map.h"
+
+namespace dlp {
+
+const char* const kBuiltInExtensions[25] = {"xls", "xlsx",     "doc", "docx", "ppt", "pptx", "pdf",
+                                            "jpg", "jpeg",     "mp4", "zip",  "txt", "asd",  "xlam",
+                                            "htm", "html",     "mht", "eml",  "msg", "hwp",  "gul",
+                                            "rtf", "ostrilex", "png", "gif"};
+
+}  // namespace dlp
 
 namespace {
 
@@ -38,7 +48,7 @@ std::vector<std::string> getExtensions(const char* list, char delimiter) {
 }
 
 void HashMap::makeExtensionGroups() {
-    auto lock = dlp::lockLibraryState();
+    dlp::LibraryLockGuard guard;
     // "xls" and "xlsx" relate to each other as "ppt" and "pptx" do.
     const std::pair<const char*, std::vector<std::string>> rows[] = {
             {"tmp", {"xlsx", "xls", "docx", "doc", "rtf", "txt", "ppt", "pptx"}},
@@ -61,17 +71,29 @@ void HashMap::makeExtensionGroups() {
 }
 
 int HashMap::getValidMapEntryIndexForExt(std::string extension, std::vector<MapEntry> entries) {
-    auto lock = dlp::lockLibraryState();
-    auto group = mExtensionGroups.find(extension);
-    if (group == mExtensionGroups.end()) {
+    dlp::LibraryLockGuard guard;
+    return dlp::relatedEntryIndex(*this, extension, entries);
+}
+
+namespace dlp {
+
+void replaceExtensionList(std::vector<std::string> extensions) {
+    mProcessMap.mExtensionList.clear();
+    for (std::string& extension : extensions) mProcessMap.addExtension(std::move(extension));
+}
+
+int relatedEntryIndex(const HashMap& map, const std::string& extension,
+                      const std::vector<MapEntry>& entries) {
+    auto group = map.mExtensionGroups.find(extension);
+    if (group == map.mExtensionGroups.end()) {
         DLP_SYSTEM_ERROR(
                 "DLP_LIBDLP : <HashMap::getValidMapEntryIndexForExt> record with key[%s] not "
                 "found.",
                 extension.c_str());
-        return -2;
+        return kNoEntryIndex;
     }
     // The most recent entry of any related extension: the highest index that matches.
-    int result = -2;
+    int result = kNoEntryIndex;
     for (const std::string& related : group->second) {
         int lowest = result < 0 ? 0 : result + 1;
         for (int index = static_cast<int>(entries.size()) - 1; index >= lowest; --index) {
@@ -83,3 +105,5 @@ int HashMap::getValidMapEntryIndexForExt(std::string extension, std::vector<MapE
     }
     return result;
 }
+
+}  // namespace dlp

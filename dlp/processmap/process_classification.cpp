@@ -1,8 +1,8 @@
-#include <dlp_sdk/file_open_tracking.h>
+#include <dlp_sdk/clock.h>
 #include <dlp_sdk/process_name.h>
 
 #include "primitives/platform_log.h"
-#include "processmap/hash_map.h"
+#include "processmap/process_map_internal.h"
 
 bool HashMap::isRejectedPid(int pid, MapEntry entry) {
     if (mRejectList.count(pid) != 0) {
@@ -35,7 +35,8 @@ bool HashMap::isWhitelistedProcess(std::string processName, MapEntry entry) {
         return true;
     }
     // The office suite runs several processes, all named after its package.
-    if (processName.compare(0, HANCOM_OFFICE_PACKAGE.size(), HANCOM_OFFICE_PACKAGE) == 0) {
+    if (std::string_view(processName).substr(0, HANCOM_OFFICE_PACKAGE.size()) ==
+        HANCOM_OFFICE_PACKAGE) {
         DLP_SYSTEM_DEBUG(
                 "DLP_LIBDLP : <HashMap::isWhitelistedProcess> pid match with Hancom process");
         return true;

@@ -1,5 +1,7 @@
-#include <dlp_sdk/expiry_after_table.h>
+#include "store/expiry_after_table.h"
 
+#include <android-base/unique_fd.h>
+#include <dlp_sdk/expiry_after_table.h>
 #include <fcntl.h>
 #include <sqlite3.h>
 #include <sys/stat.h>
@@ -8,9 +10,7 @@
 #include <ctime>
 #include <memory>
 
-#include "primitives/library_lock.h"
 #include "primitives/platform_log.h"
-#include "primitives/unique_fd.h"
 
 namespace {
 
@@ -21,6 +21,8 @@ constexpr const char* kSelectDuration = "SELECT Id, Time FROM dlpInfo WHERE Id =
 constexpr int kFirstId = 100;
 constexpr int kIdCount = 100;
 constexpr int kEmptySlot = -1;
+// What get_expiryAfter_time gives when no duration can be read: one second, failing closed.
+constexpr int kUnreadableDuration = 1;
 
 struct DatabaseCloser {
     void operator()(sqlite3* database) const { sqlite3_close(database); }
@@ -42,7 +44,7 @@ constexpr std::array<int, kIdCount> emptyCache() {
 }
 
 // Durations by id - 100; served without touching the database once filled.
-std::array<int, kIdCount> expiry_after_cache = emptyCache();
+std::array<int, kIdCount> expiry_after_cache GUARDED_BY(dlp::libraryLock) = emptyCache();
 
 bool isValidId(int id) {
     return id >= kFirstId && id < kFirstId + kIdCount;
@@ -54,8 +56,8 @@ Database openDatabase(const char* label) {
     int result = sqlite3_open(kDatabasePath, &handle);
     Database database(handle);
     if (result != SQLITE_OK) {
-        DLP_PRINT_ERROR("DLP_LIBEPM : %s Cannot open database: %s\n", label,
-                        handle ? sqlite3_errmsg(handle) : sqlite3_errstr(result));
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : %s Cannot open database: %s\n", label,
+                          handle ? sqlite3_errmsg(handle) : sqlite3_errstr(result));
         return nullptr;
     }
     return database;
@@ -65,8 +67,8 @@ Database openDatabase(const char* label) {
 Statement selectDuration(sqlite3* database, int id, const char* label) {
     sqlite3_stmt* handle = nullptr;
     if (sqlite3_prepare_v2(database, kSelectDuration, -1, &handle, nullptr) != SQLITE_OK) {
-        DLP_PRINT_ERROR("DLP_LIBEPM : %s Failed to execute statement: %s\n", label,
-                        sqlite3_errmsg(database));
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : %s Failed to execute statement: %s\n", label,
+                          sqlite3_errmsg(database));
         sqlite3_finalize(handle);
         return nullptr;
     }
@@ -83,12 +85,9 @@ bool execute(sqlite3* database, const char* sql, SqliteText& error) {
     return result == SQLITE_OK;
 }
 
-}  // namespace
-
-int init_table() {
-    auto lock = dlp::lockLibraryState();
+int initTableLocked() REQUIRES(dlp::libraryLock) {
     {
-        dlp::UniqueFd existing(open(kDatabasePath, O_RDONLY | O_CLOEXEC));
+        android::base::unique_fd existing(open(kDatabasePath, O_RDONLY | O_CLOEXEC));
         if (existing.ok()) return 0;
     }
     // May exist already; sqlite3_open reports anything that matters.
@@ -97,21 +96,24 @@ int init_table() {
     if (!database) return 1;
     SqliteText error;
     if (!execute(database.get(), kCreateTable, error)) {
-        DLP_PRINT_ERROR("DLP_LIBEPM : init_table : SQL error: %s\n", error.get());
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : init_table : SQL error: %s\n", error.get());
         return 1;
     }
     return 0;
 }
 
-int set_time(int id, int time) {
-    auto lock = dlp::lockLibraryState();
+}  // namespace
+
+namespace dlp {
+
+int setTimeLocked(int id, int time) {
     if (!isValidId(id)) {
-        DLP_PRINT_ERROR("DLP_LIBEPM : set_time : set_time error : id : %d, index : %d\n", id,
-                        id - kFirstId);
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : set_time : set_time error : id : %d, index : %d\n", id,
+                          id - kFirstId);
         return 1;
     }
     expiry_after_cache[id - kFirstId] = time;
-    if (init_table() == 1) return 1;
+    if (initTableLocked() == 1) return 1;
     Database database = openDatabase("set_time :");
     if (!database) return 1;
     // A crash between creating the file and its table leaves a file without the table; without
@@ -124,28 +126,29 @@ int set_time(int id, int time) {
     if (select && sqlite3_step(select.get()) == SQLITE_ROW) {
         sql.reset(sqlite3_mprintf("Update dlpInfo Set Time = %d Where Id = %d", time, id));
     } else {
-        DLP_PRINT_ERROR("DLP_LIBEPM : set_time : id : %d, It is not in the table. add time as %d\n",
-                        id, time);
+        DLP_PRIMITIVE_LOG(
+                "DLP_LIBEPM : set_time : id : %d, It is not in the table. add time as %d\n", id,
+                time);
         sql.reset(sqlite3_mprintf("INSERT INTO dlpInfo VALUES(%d, %d)", id, time));
     }
     SqliteText error;
     if (!sql || !execute(database.get(), sql.get(), error)) {
-        DLP_PRINT_ERROR("DLP_LIBEPM : set_time : SQL error: %s\n",
-                        error ? error.get() : "out of memory");
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : set_time : SQL error: %s\n",
+                          error ? error.get() : "out of memory");
         return 1;
     }
     return 0;
 }
 
-int get_time(int id) {
-    auto lock = dlp::lockLibraryState();
+int getTimeLocked(int id) {
     if (!isValidId(id)) {
-        DLP_PRINT_ERROR("DLP_LIBEPM : get_time : error : id : %d, index : %d\n", id, id - kFirstId);
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : get_time : error : id : %d, index : %d\n", id,
+                          id - kFirstId);
         return -1;
     }
     int& slot = expiry_after_cache[id - kFirstId];
     if (slot != kEmptySlot) return slot;
-    if (init_table() == 1) return -1;
+    if (initTableLocked() == 1) return -1;
     Database database = openDatabase("get_time :");
     if (!database) return -1;
     Statement select = selectDuration(database.get(), id, "get_time :");
@@ -153,29 +156,54 @@ int get_time(int id) {
         slot = sqlite3_column_int(select.get(), 1);
         return slot;
     }
-    DLP_PRINT_ERROR("DLP_LIBEPM : get_time : No id in the list\n");
+    DLP_PRIMITIVE_LOG("DLP_LIBEPM : get_time : No id in the list\n");
     return -1;
 }
 
-int set_expiryAfter_time(int id, int time) {
-    auto lock = dlp::lockLibraryState();
-    int result = set_time(id, time);
-    if (result != 0) DLP_PRINT_ERROR("DLP_LOG : set id : %d, time : %d is fail\n", id, time);
-    return result;
-}
-
-int get_expiryAfter_time(int id) {
-    auto lock = dlp::lockLibraryState();
-    int result = get_time(id);
+int expiryAfterTimeLocked(int id) {
+    int result = getTimeLocked(id);
     if (result == -1) {
-        DLP_PRINT_ERROR("DLP_LOG : get id : %d is fail\n", id);
-        return 1;
+        DLP_PRIMITIVE_LOG("DLP_LOG : get id : %d is fail\n", id);
+        return kUnreadableDuration;
     }
     return result;
 }
 
-long getITAdminExpiryTime(int id) {
-    auto lock = dlp::lockLibraryState();
+long adminExpiryTimeLocked(int id) {
     long now = time(nullptr);
-    return now + static_cast<long>(get_expiryAfter_time(id));
+    return now + static_cast<long>(expiryAfterTimeLocked(id));
+}
+
+}  // namespace dlp
+
+int init_table() {
+    dlp::LibraryLockGuard guard;
+    return initTableLocked();
+}
+
+int set_time(int id, int time) {
+    dlp::LibraryLockGuard guard;
+    return dlp::setTimeLocked(id, time);
+}
+
+int get_time(int id) {
+    dlp::LibraryLockGuard guard;
+    return dlp::getTimeLocked(id);
+}
+
+int set_expiryAfter_time(int id, int time) {
+    dlp::LibraryLockGuard guard;
+    int result = dlp::setTimeLocked(id, time);
+    if (result != 0) DLP_PRIMITIVE_LOG("DLP_LOG : set id : %d, time : %d is fail\n", id, time);
+    return result;
+}
+
+int get_expiryAfter_time(int id) {
+    dlp::LibraryLockGuard guard;
+    return dlp::expiryAfterTimeLocked(id);
+}
+
+long getITAdminExpiryTime(int id) {
+    dlp::LibraryLockGuard guard;
+    return dlp::adminExpiryTimeLocked(id);
 }

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <dlp_sdk/clock.h>
 #include <dlp_sdk/export.h>
 #include <dlp_sdk/process_map.h>
 
@@ -9,6 +10,3 @@ DLP_EXPORT int setExpiryforFile(int pid, char* path, int containerId);
 
 // True when `entry` must not lend its expiry to a new file of `pid`. `path` is not read.
 DLP_EXPORT bool isNewFileCase(MapEntry entry, char* path, long currentTime, int pid);
-
-// 23:59:59 of the current local day, in seconds since the epoch.
-DLP_EXPORT long getEndOfDay();

@@ -280,7 +280,7 @@ TEST_F(CommandDispatcherTest, LogStateCommandSetsAuditLogState) {
 TEST_F(CommandDispatcherTest, WaitsForLibraryLock) {
     int result = -2;
     auto setLogState = [&] { result = runCommand({"6", "100", "1"}); };
-    EXPECT_TRUE(waitsForLibraryLock(setLogState, [] { EXPECT_EQ(getDLPAuditLogState(), 0); }));
+    EXPECT_TRUE(waitsForLibraryLock(setLogState, [] { EXPECT_EQ(mProcessMap.mLogState, 0); }));
     EXPECT_EQ(result, 0);
     EXPECT_EQ(getDLPAuditLogState(), 1);
 

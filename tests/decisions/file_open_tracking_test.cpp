@@ -7,7 +7,7 @@
 #include <string>
 
 #include "decisions/frozen_clock.h"
-#include "decisions/path_extension.h"
+#include "primitives/path_extension.h"
 #include "support/library_messages.h"
 #include "support/log_capture.h"
 #include "support/process_map_reset.h"

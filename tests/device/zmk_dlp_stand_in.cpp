@@ -14,6 +14,7 @@
 #define FUSE_USE_VERSION 35
 #include <fuse_lowlevel.h>
 
+#include <android-base/unique_fd.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -28,8 +29,6 @@
 #include <sstream>
 #include <string>
 
-#include "primitives/unique_fd.h"
-
 namespace {
 
 constexpr unsigned int kLockEnable = 0x40047801;
@@ -39,7 +38,7 @@ constexpr size_t kIdSize = 4;
 constexpr size_t kExtensionRecordSize = 1008;
 constexpr const char* kDefaultStateDirectory = "/run/zmk_dlp";
 
-using dlp::UniqueFd;
+using android::base::unique_fd;
 
 std::string stateDirectory;
 
@@ -59,7 +58,7 @@ bool writeAll(int fd, const std::string& text) {
 }
 
 bool appendToStateFile(const std::string& name, const std::string& text) {
-    UniqueFd file(open(statePath(name).c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644));
+    unique_fd file(open(statePath(name).c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644));
     if (!file.ok() || !writeAll(file.get(), text)) {
         fprintf(stderr, "zmk_dlp_stand_in: cannot append to %s: %s\n", statePath(name).c_str(),
                 strerror(errno));
@@ -73,7 +72,7 @@ bool replaceStateFile(const std::string& name, const std::string& text) {
     const std::string path = statePath(name);
     const std::string temporaryPath = statePath("." + name + ".new");
     {
-        UniqueFd file(open(temporaryPath.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644));
+        unique_fd file(open(temporaryPath.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644));
         if (!file.ok() || !writeAll(file.get(), text)) {
             fprintf(stderr, "zmk_dlp_stand_in: cannot write %s: %s\n", temporaryPath.c_str(),
                     strerror(errno));
@@ -88,7 +87,7 @@ bool replaceStateFile(const std::string& name, const std::string& text) {
 }
 
 std::optional<std::string> readStateFile(const std::string& name) {
-    UniqueFd file(open(statePath(name).c_str(), O_RDONLY | O_CLOEXEC));
+    unique_fd file(open(statePath(name).c_str(), O_RDONLY | O_CLOEXEC));
     if (!file.ok()) return std::nullopt;
     std::string content;
     char buffer[4096];

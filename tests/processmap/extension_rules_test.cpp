@@ -3,7 +3,7 @@
 #include <string>
 #include <vector>
 
-#include "processmap/hash_map.h"
+#include "processmap/process_map_internal.h"
 #include "support/library_messages.h"
 #include "support/log_capture.h"
 #include "support/process_map_reset.h"

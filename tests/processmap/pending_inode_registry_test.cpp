@@ -5,7 +5,7 @@
 #include <climits>
 #include <map>
 
-#include "processmap/hash_map.h"
+#include "processmap/process_map_internal.h"
 #include "support/log_capture.h"
 #include "support/process_map_reset.h"
 

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "processmap/hash_map.h"
+#include "processmap/process_map_internal.h"
 #include "support/child_process.h"
 #include "support/command_vector.h"
 #include "support/scratch_directory.h"

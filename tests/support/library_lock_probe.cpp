@@ -15,7 +15,7 @@ namespace dlp::test {
 
 bool waitsForLibraryLock(const std::function<void()>& call,
                          const std::function<void()>& whileHeld) {
-    auto lock = dlp::lockLibraryState();
+    dlp::libraryLock.lock();
     std::atomic<bool> started{false}, finished{false};
     char task[64] = {};
     std::thread caller([&] {
@@ -39,7 +39,7 @@ bool waitsForLibraryLock(const std::function<void()>& call,
     }
     bool waited = !finished;
     if (waited) whileHeld();
-    lock.unlock();
+    dlp::libraryLock.unlock();
     caller.join();
     return waited;
 }

@@ -5,12 +5,13 @@
 
 #include <cstdlib>
 #include <cstring>
-#include <ctime>
 
-#include "decisions/path_extension.h"
 #include "primitives/library_lock.h"
+#include "primitives/path_extension.h"
 #include "primitives/platform_log.h"
-#include "processmap/hash_map.h"
+#include "processmap/extension_rules.h"
+#include "processmap/process_map_internal.h"
+#include "store/expiry_after_table.h"
 
 namespace {
 
@@ -24,8 +25,8 @@ enum Command {
 };
 
 // Longer texts are refused: cutting them would name another file or another extension.
-constexpr size_t kPathBufferSize = 4096;
-constexpr size_t kExtensionListBufferSize = 1000;
+constexpr size_t kLongestPath = 4095;
+constexpr size_t kLongestExtensionList = 999;
 
 int expectedArgumentCount(int command) {
     switch (command) {
@@ -53,24 +54,27 @@ bool hasNullArgument(int argc, char** argv) {
     return false;
 }
 
-bool fitsPathBuffer(const char* path) {
-    size_t length = strnlen(path, kPathBufferSize);
-    if (length < kPathBufferSize) return true;
+bool isPathTooLong(const char* path) {
+    size_t length = strnlen(path, kLongestPath + 1);
+    if (length <= kLongestPath) return false;
     DLP_SYSTEM_ERROR(
             "DLP_LIBDLP : <handleDLPCommands> FATAL: file path of %zu bytes or more is too long",
             length);
-    return false;
+    return true;
 }
 
 int stampFile(int containerId, char* path, const char* expiryText) {
-    if (!fitsPathBuffer(path)) return -1;
+    if (isPathTooLong(path)) return -1;
     long expiry = strtol(expiryText, nullptr, 0);
-    if (mProcessMap.isValidExtension(getExtensionFromPath(path)) == 0) {
-        DLP_SYSTEM_ERROR(
-                "DLP_LIBDLP : <handleDLPCommands> extension passed is not valid. setting IT Admin "
-                "set Expiry");
-        expiry = static_cast<long>(time(nullptr)) +
-                 static_cast<long>(get_expiryAfter_time(containerId));
+    std::string extension = getExtensionFromPath(path);
+    {
+        dlp::LibraryLockGuard guard;
+        if (mProcessMap.isValidExtension(std::move(extension)) == 0) {
+            DLP_SYSTEM_ERROR(
+                    "DLP_LIBDLP : <handleDLPCommands> extension passed is not valid. setting IT "
+                    "Admin set Expiry");
+            expiry = dlp::adminExpiryTimeLocked(containerId);
+        }
     }
     int result = set_dlp_file_expiry_time(path, expiry);
     if (result < 0) {
@@ -96,7 +100,7 @@ int storeDuration(int containerId, int duration) {
 }
 
 int recordFileOpen(int pid, char* path) {
-    if (!fitsPathBuffer(path)) return -1;
+    if (isPathTooLong(path)) return -1;
     if (!addOrUpdateMapEntry(pid, path)) {
         DLP_SYSTEM_ERROR(
                 "DLP_LIBDLP : <handleDLPCommands> Error: addOrUpdateMapEntry failed with error "
@@ -109,8 +113,8 @@ int recordFileOpen(int pid, char* path) {
 }
 
 int replaceExtensionList(const char* list) {
-    size_t length = strnlen(list, kExtensionListBufferSize);
-    if (length >= kExtensionListBufferSize) {
+    size_t length = strnlen(list, kLongestExtensionList + 1);
+    if (length > kLongestExtensionList) {
         DLP_SYSTEM_ERROR(
                 "DLP_LIBDLP : <handleDLPCommands> FATAL: extension list of %zu bytes or more is "
                 "too long",
@@ -119,8 +123,8 @@ int replaceExtensionList(const char* list) {
     }
     DLP_SYSTEM_DEBUG("DLP_LIBDLP : <handleDLPCommands> Extension recieved : %s\n", list);
     std::vector<std::string> extensions = getExtensions(list, ',');
-    mProcessMap.mExtensionList.clear();
-    for (std::string& extension : extensions) mProcessMap.addExtension(std::move(extension));
+    dlp::LibraryLockGuard guard;
+    dlp::replaceExtensionList(std::move(extensions));
     return 0;
 }
 
@@ -129,14 +133,20 @@ int setLogState(int containerId, int logState) {
             "DLP_LIBDLP : <handleDLPCommands> setDLPExpiryAfter command [ContainerId = %d, "
             "logState = %d]",
             containerId, logState);
-    mProcessMap.mLogState = logState;
+    dlp::LibraryLockGuard guard;
+    dlp::setAuditLogState(logState);
+    return 0;
+}
+
+int removeProcess(int pid) {
+    dlp::LibraryLockGuard guard;
+    mProcessMap.remove(pid);
     return 0;
 }
 
 }  // namespace
 
 int handleDLPCommands(int argc, char** argv) {
-    auto lock = dlp::lockLibraryState();
     if (argc < 2) {
         DLP_SYSTEM_ERROR(
                 "DLP_LIBDLP : <handleDLPCommands> FATAL: argument passed should at least contain "
@@ -157,8 +167,7 @@ int handleDLPCommands(int argc, char** argv) {
     }
     switch (command) {
         case DLP_CMD_PROCESS_REMOVE:
-            mProcessMap.remove(atoi(argv[2]));
-            return 0;
+            return removeProcess(atoi(argv[2]));
         case DLP_CMD_FILE_EXPIRY_SET:
             return stampFile(atoi(argv[2]), argv[3], argv[4]);
         case DLP_CMD_EXPIRY_AFTER_SET:

@@ -2,7 +2,13 @@
 
 #include "primitives/library_lock.h"
 #include "primitives/platform_log.h"
-#include "processmap/hash_map.h"
+#include "processmap/process_map_internal.h"
+
+namespace {
+
+constexpr int kNotParked = -1;
+
+}  // namespace
 
 bool HashMap::addPendingInode(unsigned long inode, int pid) {
     // The first pid parked for an inode stays.
@@ -11,28 +17,28 @@ bool HashMap::addPendingInode(unsigned long inode, int pid) {
 }
 
 bool putPendingInodeValue(unsigned long inode, int pid) {
-    auto lock = dlp::lockLibraryState();
     if (inode == 0 || pid < 0) {
         DLP_SYSTEM_ERROR(
                 "DLP_LIBDLP : <putPendingInodeValue> Invalid parameter inode/pid. Return false");
         return false;
     }
+    dlp::LibraryLockGuard guard;
     return mProcessMap.addPendingInode(inode, pid);
 }
 
 int getPidByInode(unsigned long inode) {
-    auto lock = dlp::lockLibraryState();
     if (inode == 0) {
         DLP_SYSTEM_ERROR("DLP_LIBDLP : <getPidByInode> Invalid parameter inode. Return false");
         return 0;
     }
+    dlp::LibraryLockGuard guard;
     auto pair = HashMap::mPendingInodeMap.find(inode);
-    return pair == HashMap::mPendingInodeMap.end() ? -1 : pair->second;
+    return pair == HashMap::mPendingInodeMap.end() ? kNotParked : pair->second;
 }
 
 bool clearPendingInode(unsigned long inode) {
     if (inode == 0) return false;
-    auto lock = dlp::lockLibraryState();
+    dlp::LibraryLockGuard guard;
     HashMap::mPendingInodeMap.erase(inode);
     return true;
 }

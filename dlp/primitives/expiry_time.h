@@ -1,0 +1,9 @@
+#pragma once
+
+// Expiry times are seconds since the epoch; only values greater than 0 count.
+namespace dlp {
+
+// Stands for no expiry wherever an expiry is read or looked up.
+constexpr long kNoExpiry = -1;
+
+}  // namespace dlp
