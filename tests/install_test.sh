@@ -1,33 +1,38 @@
 #!/usr/bin/env bash
-# Installs the built library into a scratch prefix and builds an outside program against it, the
-# way users link it: every exported header on its own, -ldlp_sdk, nothing from the source tree.
+# Installs the built library into a scratch prefix and builds one outside program against it both
+# ways other builds find it, find_package(dlp_sdk CONFIG) and pkg-config, then runs both; every
+# installed header must also compile on its own.
+# Usage: install_test.sh BUILD_DIR PROJECT_VERSION
 set -euo pipefail
 build_dir=$1
-prefix=$(mktemp -d)
-trap 'rm -rf "$prefix"' EXIT
+version=$2
+consumer=$(cd "$(dirname "$0")/install_consumer" && pwd)
+work=$(mktemp -d)
+trap 'rm -rf "$work"' EXIT
+prefix=$work/prefix
 
 cmake --install "$build_dir" --prefix "$prefix" >/dev/null
-test -f "$prefix/lib/libdlp_sdk.so"
+export PKG_CONFIG_PATH=$prefix/lib/pkgconfig
+pc_version=$(pkg-config --modversion dlp_sdk)
+[ "$pc_version" = "$version" ] || { echo "dlp_sdk.pc says version '$pc_version'" >&2; exit 1; }
+read -ra cflags < <(pkg-config --cflags dlp_sdk)
+read -ra libs < <(pkg-config --libs dlp_sdk)
 
 for header in "$prefix"/include/dlp_sdk/*.h; do
-  echo "#include <dlp_sdk/$(basename "$header")>" | g++ -std=c++17 -Wall -Wextra -Werror \
-    -I"$prefix/include" -x c++ -fsyntax-only -
+  echo "#include <dlp_sdk/${header##*/}>" |
+    g++ -std=c++17 -Wall -Wextra -Werror "${cflags[@]}" -x c++ -fsyntax-only -
 done
 
-cat >"$prefix/consumer.cpp" <<'CPP'
-#include <dlp_sdk/expiry_attribute.h>
-#include <dlp_sdk/process_map.h>
-#include <cstdio>
-int main(int, char** argv) {
-    std::vector<std::string> tokens = getExtensions("pdf,docx", ',');
-    long expiry = get_dlp_file_expiry_time(argv[0]);
-    bool valid = mProcessMap.mDefaultExtensions.size() == 25;
-    std::printf("%zu %ld %d\n", tokens.size(), expiry, valid ? getDLPAuditLogState() : -1);
-    return tokens.size() == 2 && expiry == -1 && valid ? 0 : 1;
-}
-CPP
-g++ -std=c++17 -I"$prefix/include" "$prefix/consumer.cpp" -L"$prefix/lib" -ldlp_sdk \
-  -Wl,-rpath,"$prefix/lib" -o "$prefix/consumer"
-output=$("$prefix/consumer" 2>/dev/null)
-[ "$output" = "2 -1 0" ] || { echo "consumer printed '$output'"; exit 1; }
-echo "installed library links and runs"
+g++ -std=c++17 -Wall -Wextra -Werror "${cflags[@]}" "$consumer/consumer.cpp" "${libs[@]}" \
+  -Wl,-rpath,"$(pkg-config --variable=libdir dlp_sdk)" -o "$work/pkg-config-consumer"
+cmake -S "$consumer" -B "$work/cmake-consumer" -DCMAKE_PREFIX_PATH="$prefix" \
+  -DDLP_SDK_EXPECTED_VERSION="$version" >/dev/null
+cmake --build "$work/cmake-consumer" >/dev/null
+
+for program in "$work/pkg-config-consumer" "$work/cmake-consumer/consumer"; do
+  if ! output=$("$program" 2>/dev/null) || [ "$output" != "2 -1 0" ]; then
+    echo "${program##*/} failed, printing '$output'" >&2
+    exit 1
+  fi
+done
+echo "installed package found by CMake and by pkg-config; both consumers link and run"

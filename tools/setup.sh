@@ -8,6 +8,7 @@ packages=(
   libgtest-dev libgmock-dev libbenchmark-dev
   libfuse3-dev fuse3 faketime util-linux mount
   openjdk-17-jdk-headless junit5
+  clang lld libc++-dev libc++abi-dev blueprint-tools
 )
 
 missing=()

@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# The project's test command: installs what is missing, builds everything, checks the formatting
-# and runs every test.
+# The project's test command: installs what is missing, builds everything, checks the formatting,
+# Android.bp and a libc++ build's exports, and runs every test.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
@@ -11,6 +11,8 @@ cmake -S . -B "$build" -DCMAKE_BUILD_TYPE=Release -DDLP_BUILD_TESTS=ON
 cmake --build "$build" -j "$(nproc)"
 
 tools/check-format.sh
+tools/check-android-bp.sh "$build"
+tools/check-libcxx-exports.sh "$build"
 
 cd "$build"
 ctest --output-on-failure -j "$(nproc)"
