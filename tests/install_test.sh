@@ -30,4 +30,10 @@ g++ -std=c++17 -I"$prefix/include" "$prefix/consumer.cpp" -L"$prefix/lib" -ldlp_
   -Wl,-rpath,"$prefix/lib" -o "$prefix/consumer"
 output=$("$prefix/consumer" 2>/dev/null)
 [ "$output" = "2 -1 0" ] || { echo "consumer printed '$output'"; exit 1; }
-echo "installed library links and runs"
+
+# The program runs from the prefix, against the installed library, its sandbox beside it.
+test -x "$prefix/bin/dlp-sandbox"
+touch "$prefix/unstamped"
+output=$("$prefix/bin/dlpctl" show "$prefix/unstamped")
+[ "$output" = "$prefix/unstamped: no expiry" ] || { echo "dlpctl printed '$output'"; exit 1; }
+echo "installed library links and runs, and so does dlpctl"
