@@ -2,18 +2,21 @@
 // replays traces of what a device saw.
 #include <android/log.h>
 #include <dlp_sdk/expiry_attribute.h>
+#include <fcntl.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
-#include <fstream>
 #include <iostream>
 #include <optional>
+#include <sstream>
 #include <string>
 #include <vector>
 
 #include "demo.h"
 #include "expiry_text.h"
+#include "file_descriptor.h"
 #include "file_expiry.h"
 #include "replay_clock.h"
 #include "sandbox_check.h"
@@ -91,11 +94,19 @@ int runReplay(const Verb& verb, const Arguments& arguments, const Options&) {
     if (arguments.size() != 1) return usageError(verb, "give one trace");
     const std::string& traceName = arguments[0];
     if (traceName == "-") return replayTrace(std::cin, traceName, false);
-    std::ifstream trace(traceName);
-    if (!trace) {
+    // Read whole through a descriptor of its own, which the trace's app processes must not inherit.
+    FileDescriptor file(open(traceName.c_str(), O_RDONLY | O_CLOEXEC));
+    std::string text;
+    char buffer[4096];
+    ssize_t length = file.get() < 0 ? -1 : 0;
+    while (file.get() >= 0 && (length = read(file.get(), buffer, sizeof(buffer))) > 0) {
+        text.append(buffer, static_cast<size_t>(length));
+    }
+    if (length < 0) {
         fprintf(stderr, "dlpctl: %s: %s\n", traceName.c_str(), strerror(errno));
         return kFailure;
     }
+    std::istringstream trace(text);
     return replayTrace(trace, traceName, false);
 }
 
