@@ -18,7 +18,7 @@
 
 namespace {
 
-// Relative paths: the scratch directory is the working directory while it plays.
+// Played with the scratch directory as the working directory.
 constexpr const char* kDemoTrace =
         R"(# The administrator keeps the new files of container 150 for one day.
 3 150 86400 => 0
@@ -71,7 +71,8 @@ int runThroughSandbox(bool showLog) {
 int runDemo(bool showLog, bool useSystemPaths) {
     if (!useSystemPaths && !insideSandbox()) return runThroughSandbox(showLog);
 
-    // No "." in the directory's path: the library takes the extension from the whole path.
+    // The library takes the extension from the whole path: no "." in the directory's name, and
+    // the trace names its files relative to it.
     char directory[] = "/tmp/dlpctl-demo-XXXXXX";
     FileDescriptor startDirectory(open(".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     if (startDirectory.get() < 0 || mkdtemp(directory) == nullptr || chdir(directory) != 0) {
