@@ -35,4 +35,9 @@ for program in "$work/pkg-config-consumer" "$work/cmake-consumer/consumer"; do
     exit 1
   fi
 done
-echo "installed package found by CMake and by pkg-config; both consumers link and run"
+# The program runs from the prefix, against the installed library, its sandbox beside it.
+test -x "$prefix/bin/dlp-sandbox"
+touch "$prefix/unstamped"
+output=$("$prefix/bin/dlpctl" show "$prefix/unstamped")
+[ "$output" = "$prefix/unstamped: no expiry" ] || { echo "dlpctl printed '$output'"; exit 1; }
+echo "installed package found by CMake and by pkg-config; both consumers and dlpctl run"

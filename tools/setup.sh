@@ -6,7 +6,7 @@ packages=(
   build-essential cmake pkg-config clang-format
   android-liblog-dev android-libbase-dev libsqlite3-dev sqlite3
   libgtest-dev libgmock-dev libbenchmark-dev
-  libfuse3-dev fuse3 faketime util-linux mount
+  libfuse3-dev fuse3 faketime util-linux mount attr
   openjdk-17-jdk-headless junit5
   clang lld libc++-dev libc++abi-dev blueprint-tools
 )
