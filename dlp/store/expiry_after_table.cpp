@@ -7,6 +7,8 @@
 #include <sys/stat.h>
 
 #include <array>
+#include <cerrno>
+#include <cstring>
 #include <ctime>
 #include <memory>
 
@@ -23,6 +25,8 @@ constexpr int kIdCount = 100;
 constexpr int kEmptySlot = -1;
 // What get_expiryAfter_time gives when no duration can be read: one second, failing closed.
 constexpr int kUnreadableDuration = 1;
+// Other processes share the file: a connection waits this long for their locks.
+constexpr int kBusyTimeoutMilliseconds = 1000;
 
 struct DatabaseCloser {
     void operator()(sqlite3* database) const { sqlite3_close(database); }
@@ -50,6 +54,11 @@ bool isValidId(int id) {
     return id >= kFirstId && id < kFirstId + kIdCount;
 }
 
+// id - 100 as the messages print it, wrapped as two's complement rather than overflowing.
+int indexOf(int id) {
+    return static_cast<int>(static_cast<unsigned int>(id) - static_cast<unsigned int>(kFirstId));
+}
+
 // `label` names the caller as its messages do ("init_table:", "set_time :", "get_time :").
 Database openDatabase(const char* label) {
     sqlite3* handle = nullptr;
@@ -60,6 +69,7 @@ Database openDatabase(const char* label) {
                           handle ? sqlite3_errmsg(handle) : sqlite3_errstr(result));
         return nullptr;
     }
+    sqlite3_busy_timeout(database.get(), kBusyTimeoutMilliseconds);
     return database;
 }
 
@@ -85,13 +95,49 @@ bool execute(sqlite3* database, const char* sql, SqliteText& error) {
     return result == SQLITE_OK;
 }
 
+// One write transaction, rolled back unless committed. IMMEDIATE takes the write lock before the
+// look-up, so no other process can add the id's row between the look-up and the write.
+class WriteTransaction {
+  public:
+    explicit WriteTransaction(sqlite3* database) : database_(database) {}
+    ~WriteTransaction() {
+        if (begun_) sqlite3_exec(database_, "ROLLBACK", nullptr, nullptr, nullptr);
+    }
+    WriteTransaction(const WriteTransaction&) = delete;
+    WriteTransaction& operator=(const WriteTransaction&) = delete;
+
+    bool begin(SqliteText& error) { return begun_ = execute(database_, "BEGIN IMMEDIATE", error); }
+    bool commit(SqliteText& error) {
+        if (!execute(database_, "COMMIT", error)) return false;
+        begun_ = false;
+        return true;
+    }
+
+  private:
+    sqlite3* database_;
+    bool begun_ = false;
+};
+
+// sqlite3_step's outcome for a look-up: a row, no row, or a failure whose text it hands back.
+enum class LookUp { kRow, kNoRow, kFailed };
+
+LookUp step(sqlite3* database, sqlite3_stmt* statement, SqliteText& error) {
+    int result = sqlite3_step(statement);
+    if (result == SQLITE_ROW) return LookUp::kRow;
+    if (result == SQLITE_DONE) return LookUp::kNoRow;
+    error.reset(sqlite3_mprintf("%s", sqlite3_errmsg(database)));
+    return LookUp::kFailed;
+}
+
 int initTableLocked() REQUIRES(dlp::libraryLock) {
     {
         android::base::unique_fd existing(open(kDatabasePath, O_RDONLY | O_CLOEXEC));
         if (existing.ok()) return 0;
     }
-    // May exist already; sqlite3_open reports anything that matters.
-    mkdir(kDatabaseDirectory, 0777);
+    if (mkdir(kDatabaseDirectory, 0777) != 0 && errno != EEXIST) {
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : init_table : Cannot create directory %s: %s\n",
+                          kDatabaseDirectory, strerror(errno));
+    }
     Database database = openDatabase("init_table:");
     if (!database) return 1;
     SqliteText error;
@@ -109,7 +155,7 @@ namespace dlp {
 int setTimeLocked(int id, int time) {
     if (!isValidId(id)) {
         DLP_PRIMITIVE_LOG("DLP_LIBEPM : set_time : set_time error : id : %d, index : %d\n", id,
-                          id - kFirstId);
+                          indexOf(id));
         return 1;
     }
     expiry_after_cache[id - kFirstId] = time;
@@ -118,21 +164,30 @@ int setTimeLocked(int id, int time) {
     if (!database) return 1;
     // A crash between creating the file and its table leaves a file without the table; without
     // this, every later write would fail.
-    SqliteText ignored;
-    execute(database.get(), kCreateTable, ignored);
+    SqliteText error;
+    execute(database.get(), kCreateTable, error);
 
-    Statement select = selectDuration(database.get(), id, "set_time :");
+    WriteTransaction transaction(database.get());
+    if (!transaction.begin(error)) {
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : set_time : SQL error: %s\n", error.get());
+        return 1;
+    }
+    LookUp found = LookUp::kNoRow;
+    if (Statement select = selectDuration(database.get(), id, "set_time :")) {
+        found = step(database.get(), select.get(), error);
+    }
     SqliteText sql;
-    if (select && sqlite3_step(select.get()) == SQLITE_ROW) {
+    if (found == LookUp::kRow) {
         sql.reset(sqlite3_mprintf("Update dlpInfo Set Time = %d Where Id = %d", time, id));
-    } else {
+    } else if (found == LookUp::kNoRow) {
         DLP_PRIMITIVE_LOG(
                 "DLP_LIBEPM : set_time : id : %d, It is not in the table. add time as %d\n", id,
                 time);
         sql.reset(sqlite3_mprintf("INSERT INTO dlpInfo VALUES(%d, %d)", id, time));
     }
-    SqliteText error;
-    if (!sql || !execute(database.get(), sql.get(), error)) {
+    // A failed look-up must not pass for a missing row: that would add a second row for the id.
+    if (found == LookUp::kFailed || !sql || !execute(database.get(), sql.get(), error) ||
+        !transaction.commit(error)) {
         DLP_PRIMITIVE_LOG("DLP_LIBEPM : set_time : SQL error: %s\n",
                           error ? error.get() : "out of memory");
         return 1;
@@ -143,7 +198,7 @@ int setTimeLocked(int id, int time) {
 int getTimeLocked(int id) {
     if (!isValidId(id)) {
         DLP_PRIMITIVE_LOG("DLP_LIBEPM : get_time : error : id : %d, index : %d\n", id,
-                          id - kFirstId);
+                          indexOf(id));
         return -1;
     }
     int& slot = expiry_after_cache[id - kFirstId];
@@ -152,9 +207,15 @@ int getTimeLocked(int id) {
     Database database = openDatabase("get_time :");
     if (!database) return -1;
     Statement select = selectDuration(database.get(), id, "get_time :");
-    if (select && sqlite3_step(select.get()) == SQLITE_ROW) {
+    SqliteText error;
+    LookUp found = select ? step(database.get(), select.get(), error) : LookUp::kNoRow;
+    if (found == LookUp::kRow) {
         slot = sqlite3_column_int(select.get(), 1);
         return slot;
+    }
+    if (found == LookUp::kFailed) {
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : get_time : SQL error: %s\n", error.get());
+        return -1;
     }
     DLP_PRIMITIVE_LOG("DLP_LIBEPM : get_time : No id in the list\n");
     return -1;
