@@ -3,8 +3,11 @@
 #include <dlp_sdk/expiry_attribute.h>
 #include <dlp_sdk/file_open_tracking.h>
 
+#include <cerrno>
+#include <climits>
 #include <cstdlib>
 #include <cstring>
+#include <optional>
 
 #include "primitives/library_lock.h"
 #include "primitives/path_extension.h"
@@ -54,6 +57,43 @@ bool hasNullArgument(int argc, char** argv) {
     return false;
 }
 
+// atoi's reading of `text` (leading blanks, a sign, the digits up to the first other byte, no
+// digits reads as 0), but refused, with its message, when the value lies outside int: wrapped,
+// it would name another pid or container.
+std::optional<int> parseNumber(char* const* argv, int index) {
+    const char* cursor = argv[index];
+    while (*cursor == ' ' || (*cursor >= '\t' && *cursor <= '\r')) ++cursor;
+    bool negative = *cursor == '-';
+    if (*cursor == '-' || *cursor == '+') ++cursor;
+    // Magnitudes up to 2^31 fit; one digit more cannot come back into range.
+    constexpr unsigned long long kLargestMagnitude = 1ull + INT_MAX;
+    unsigned long long magnitude = 0;
+    for (; *cursor >= '0' && *cursor <= '9'; ++cursor) {
+        magnitude = magnitude * 10 + static_cast<unsigned long long>(*cursor - '0');
+        if (magnitude > kLargestMagnitude) break;
+    }
+    if (magnitude > kLargestMagnitude - (negative ? 0 : 1)) {
+        DLP_SYSTEM_ERROR(
+                "DLP_LIBDLP : <handleDLPCommands> FATAL: argument [%d] is out of range: %s", index,
+                argv[index]);
+        return std::nullopt;
+    }
+    return negative ? static_cast<int>(0ull - magnitude) : static_cast<int>(magnitude);
+}
+
+// strtol's reading in base 0 ("0x" hexadecimal, a leading "0" octal), refused outside long.
+std::optional<long> parseExpiry(char* const* argv, int index) {
+    int savedErrno = errno;
+    errno = 0;
+    long expiry = strtol(argv[index], nullptr, 0);
+    bool outOfRange = errno == ERANGE;
+    errno = savedErrno;
+    if (!outOfRange) return expiry;
+    DLP_SYSTEM_ERROR("DLP_LIBDLP : <handleDLPCommands> FATAL: argument [%d] is out of range: %s",
+                     index, argv[index]);
+    return std::nullopt;
+}
+
 bool isPathTooLong(const char* path) {
     size_t length = strnlen(path, kLongestPath + 1);
     if (length <= kLongestPath) return false;
@@ -63,9 +103,8 @@ bool isPathTooLong(const char* path) {
     return true;
 }
 
-int stampFile(int containerId, char* path, const char* expiryText) {
+int stampFile(int containerId, char* path, long expiry) {
     if (isPathTooLong(path)) return -1;
-    long expiry = strtol(expiryText, nullptr, 0);
     std::string extension = getExtensionFromPath(path);
     {
         dlp::LibraryLockGuard guard;
@@ -155,9 +194,10 @@ int handleDLPCommands(int argc, char** argv) {
         return -1;
     }
     if (hasNullArgument(argc, argv)) return -1;
-    int command = atoi(argv[1]);
-    if (command < DLP_CMD_PROCESS_REMOVE || command > DLP_CMD_LOG_STATE_SET) return -1;
-    int expected = expectedArgumentCount(command);
+    std::optional<int> command = parseNumber(argv, 1);
+    if (!command) return -1;
+    if (*command < DLP_CMD_PROCESS_REMOVE || *command > DLP_CMD_LOG_STATE_SET) return -1;
+    int expected = expectedArgumentCount(*command);
     if (argc != expected) {
         DLP_SYSTEM_ERROR(
                 "DLP_LIBDLP : <handleDLPCommands> FATAL: adifferent number of paramerter given "
@@ -165,18 +205,26 @@ int handleDLPCommands(int argc, char** argv) {
                 argc, expected);
         return -1;
     }
-    switch (command) {
+    // Every number is read before anything changes, so a refused one changes nothing.
+    std::optional<int> first, second;
+    std::optional<long> expiry;
+    switch (*command) {
         case DLP_CMD_PROCESS_REMOVE:
-            return removeProcess(atoi(argv[2]));
+            if (!(first = parseNumber(argv, 2))) return -1;
+            return removeProcess(*first);
         case DLP_CMD_FILE_EXPIRY_SET:
-            return stampFile(atoi(argv[2]), argv[3], argv[4]);
+            if (!(first = parseNumber(argv, 2)) || !(expiry = parseExpiry(argv, 4))) return -1;
+            return stampFile(*first, argv[3], *expiry);
         case DLP_CMD_EXPIRY_AFTER_SET:
-            return storeDuration(atoi(argv[2]), atoi(argv[3]));
+            if (!(first = parseNumber(argv, 2)) || !(second = parseNumber(argv, 3))) return -1;
+            return storeDuration(*first, *second);
         case DLP_CMD_FILE_OPEN:
-            return recordFileOpen(atoi(argv[3]), argv[4]);
+            if (!(first = parseNumber(argv, 3))) return -1;
+            return recordFileOpen(*first, argv[4]);
         case DLP_CMD_EXTENSION_SET:
             return replaceExtensionList(argv[3]);
         default:
-            return setLogState(atoi(argv[2]), atoi(argv[3]));
+            if (!(first = parseNumber(argv, 2)) || !(second = parseNumber(argv, 3))) return -1;
+            return setLogState(*first, *second);
     }
 }

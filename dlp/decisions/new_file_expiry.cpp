@@ -18,19 +18,19 @@ namespace {
 // An expiry from now to now + 20 s was put there by this very file event; any other expiry was
 // set on purpose by the file manager and stays.
 constexpr uint64_t kFreshExpiryWindow = 21;
-constexpr long kInheritableAge = 599;
+constexpr unsigned long kInheritableAge = 599;
 
 bool isExpiryAlreadySet(const char* path, long now, const char* caseName,
                         const char* alreadySetCaseName) {
     long current = get_dlp_file_expiry_time(path);
-    long difference = current - now;
+    // Unsigned on purpose, and free of overflow: an expiry already in the past counts as set.
+    uint64_t difference = static_cast<uint64_t>(current) - static_cast<uint64_t>(now);
     DLP_SYSTEM_DEBUG(
             "DLP_LIBDLP : <setExpiryforFile> %s -- current time[%d], expiry_time[%d], time "
             "diff[%d]",
             caseName, static_cast<int>(now), static_cast<int>(current),
             static_cast<int>(difference));
-    // Unsigned on purpose: an expiry already in the past counts as set as well.
-    if (current != dlp::kNoExpiry && static_cast<uint64_t>(difference) >= kFreshExpiryWindow) {
+    if (current != dlp::kNoExpiry && difference >= kFreshExpiryWindow) {
         DLP_SYSTEM_DEBUG(
                 "DLP_LIBDLP : <setExpiryforFile> %s -- DLP expiry time is already set by Filbrook "
                 "ignoring the case",
@@ -82,7 +82,10 @@ bool isNewFileCaseLocked(MapEntry entry, long currentTime, int pid) REQUIRES(dlp
                 pid);
         return true;
     }
-    return currentTime - openTime > kInheritableAge;
+    // currentTime - openTime > 599, as the arithmetic without overflow would answer.
+    return currentTime > openTime &&
+           static_cast<unsigned long>(currentTime) - static_cast<unsigned long>(openTime) >
+                   kInheritableAge;
 }
 
 }  // namespace
