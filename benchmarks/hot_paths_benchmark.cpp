@@ -105,7 +105,7 @@ void forgetProcess(pid_t pid) {
     runCommand({"1", std::to_string(pid)});
 }
 
-// The pid's most recent entry, when it is the one `path` should have left.
+// Whether the pid's most recent entry is the file just reported.
 bool storedLast(pid_t pid, const std::string& extension, long expiry) {
     auto lock = dlp::lockLibraryState();
     auto slot = HashMap::mInternalProcessMap.find(pid);
