@@ -1,115 +1,508 @@
-// The library runs on every file open and create of the device: these print what they cost.
+// The library runs on every file open and create of a phone. Each case here runs beside its
+// floor, the system calls that the same work cannot do without, under three log configurations.
+#include <dlp_sdk/commands.h>
 #include <dlp_sdk/expiry_after_table.h>
-#include <dlp_sdk/expiry_attribute.h>
 #include <dlp_sdk/file_open_tracking.h>
 #include <dlp_sdk/new_file_expiry.h>
 #include <dlp_sdk/process_map.h>
 
-#include <android/log.h>
+#include <android-base/unique_fd.h>
 #include <benchmark/benchmark.h>
-#include <malloc.h>
+#include <fcntl.h>
+#include <linux/magic.h>
+#include <stdlib.h>
+#include <sys/statfs.h>
+#include <sys/xattr.h>
 #include <unistd.h>
 
+#include <array>
+#include <cerrno>
+#include <cstdint>
 #include <cstdio>
-#include <ctime>
+#include <cstring>
+#include <filesystem>
+#include <functional>
+#include <stdexcept>
 #include <string>
+#include <vector>
 
+#include "log_configuration.h"
+#include "primitives/library_lock.h"
+#include "process_map_population.h"
 #include "support/child_process.h"
 
 namespace {
 
+using dlp::benchmarks::applyLogConfiguration;
+using dlp::benchmarks::LogConfiguration;
+
+constexpr const char* kExpiryAttribute = "user.zorvat_dlp";
+constexpr size_t kExpiryValueSize = 16;
+constexpr const char* kDatabasePath = "/data/system/users/dlp/dlpinfo.db";
 constexpr int kContainerId = 120;
+constexpr int kDurationSeconds = 86400;
+constexpr long kWeekSeconds = 7 * 86400;
+constexpr int kProcessCounts[] = {10, 10000, 100000};
+// A zip copy rewrites a stamp that lies at most this far ahead; the source zip expires this far
+// ahead, so every timed call of one run writes.
+constexpr long kZipCopyWindowSeconds = 20;
 
-// Messages are formatted as on a device, but go nowhere.
-void discardMessage(const __android_logger_data*, const char*) {}
+using ExpiryValue = std::array<unsigned char, kExpiryValueSize>;
 
-class ScratchFile {
-  public:
-    explicit ScratchFile(const char* name) : path_(std::string("/tmp/dlp-benchmark-") + name) {
-        FILE* file = fopen(path_.c_str(), "we");
-        if (file != nullptr) fclose(file);
+ExpiryValue expiryValue(long expiry) {
+    ExpiryValue value{};
+    for (size_t i = 0; i < 8; ++i) {
+        value[i] = static_cast<unsigned char>(static_cast<uint64_t>(expiry) >> (8 * i));
     }
-    ~ScratchFile() { unlink(path_.c_str()); }
-    char* path() { return path_.data(); }
+    return value;
+}
+
+void writeExpiry(const std::string& path, long expiry) {
+    ExpiryValue value = expiryValue(expiry);
+    if (setxattr(path.c_str(), kExpiryAttribute, value.data(), value.size(), 0) != 0) {
+        throw std::runtime_error("setxattr " + path + ": " + strerror(errno));
+    }
+}
+
+// The expiry on the file, -1 when it has none.
+long storedExpiry(const std::string& path) {
+    ExpiryValue value{};
+    if (getxattr(path.c_str(), kExpiryAttribute, value.data(), value.size()) !=
+        static_cast<ssize_t>(kExpiryValueSize)) {
+        return -1;
+    }
+    uint64_t bits = 0;
+    for (size_t i = 0; i < 8; ++i) bits |= static_cast<uint64_t>(value[i]) << (8 * i);
+    return static_cast<long>(bits);
+}
+
+// The library's fixed store path must be the sandbox's throwaway tmpfs, never a device's data.
+bool databaseDirectoryIsThrowaway() {
+    struct statfs fileSystem {};
+    return statfs("/data/system/users", &fileSystem) == 0 && fileSystem.f_type == TMPFS_MAGIC;
+}
+
+// A command vector as callers send it, built once so that a timed call only dispatches.
+class CommandVector {
+  public:
+    explicit CommandVector(std::vector<std::string> words) : words_(std::move(words)) {
+        words_.insert(words_.begin(), "dlp");
+        for (std::string& word : words_) argv_.push_back(word.data());
+        argv_.push_back(nullptr);
+    }
+    int run() { return handleDLPCommands(static_cast<int>(words_.size()), argv_.data()); }
+
+  private:
+    std::vector<std::string> words_;
+    std::vector<char*> argv_;
+};
+
+int runCommand(std::vector<std::string> words) {
+    return CommandVector(std::move(words)).run();
+}
+
+void forgetProcess(pid_t pid) {
+    runCommand({"1", std::to_string(pid)});
+}
+
+// Whether the pid's most recent entry is the file just reported.
+bool storedLast(pid_t pid, const std::string& extension, long expiry) {
+    dlp::LibraryLockGuard guard;
+    auto slot = HashMap::mInternalProcessMap.find(pid);
+    if (slot == HashMap::mInternalProcessMap.end()) return false;
+    const MapEntry& last = slot->second.back();
+    return last.value_pid == pid && last.value_extension == extension &&
+           last.value_expiry == expiry;
+}
+
+bool hasEntries(pid_t pid) {
+    dlp::LibraryLockGuard guard;
+    return HashMap::mInternalProcessMap.count(pid) != 0;
+}
+
+bool isRejected(pid_t pid) {
+    dlp::LibraryLockGuard guard;
+    return mProcessMap.mRejectList.count(pid) != 0;
+}
+
+// Moves the database away while it lives: a duration read meanwhile can only come from the
+// cache.
+class DatabaseAside {
+  public:
+    DatabaseAside() : moved_(rename(kDatabasePath, aside().c_str()) == 0) {}
+    ~DatabaseAside() {
+        if (moved_) rename(aside().c_str(), kDatabasePath);
+    }
+    DatabaseAside(const DatabaseAside&) = delete;
+    DatabaseAside& operator=(const DatabaseAside&) = delete;
+    bool moved() const { return moved_; }
+
+  private:
+    static std::string aside() { return std::string(kDatabasePath) + "-aside"; }
+    bool moved_;
+};
+
+class ScratchDirectory {
+  public:
+    ScratchDirectory() {
+        // No "." in the directory: the library takes the extension from the whole path.
+        std::string pattern = std::filesystem::temp_directory_path() / "dlp-benchmark-XXXXXX";
+        if (mkdtemp(pattern.data()) == nullptr) {
+            throw std::runtime_error(std::string("mkdtemp: ") + strerror(errno));
+        }
+        path_ = pattern;
+    }
+    ~ScratchDirectory() {
+        std::error_code ignored;
+        std::filesystem::remove_all(path_, ignored);
+    }
+    ScratchDirectory(const ScratchDirectory&) = delete;
+    ScratchDirectory& operator=(const ScratchDirectory&) = delete;
+
+    std::string file(const std::string& name) const {
+        std::string path = path_ + "/" + name;
+        android::base::unique_fd file(
+                open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644));
+        if (!file.ok()) throw std::runtime_error("open " + path + ": " + strerror(errno));
+        return path;
+    }
+    std::string stampedFile(const std::string& name, long expiry) const {
+        std::string path = file(name);
+        writeExpiry(path, expiry);
+        return path;
+    }
 
   private:
     std::string path_;
 };
 
-void FileOpenOfProtectedFile(benchmark::State& state) {
-    ScratchFile file("protected.pdf");
-    set_dlp_file_expiry_time(file.path(), time(nullptr) + 3600);
-    for (auto _ : state) benchmark::DoNotOptimize(addOrUpdateMapEntry(4242, file.path()));
-    mProcessMap.remove(4242);
-}
-BENCHMARK(FileOpenOfProtectedFile);
+// The files and app processes that the cases act on, built once for the whole run.
+struct Scene {
+    long start = getCurrentTimeInSec();
+    ScratchDirectory directory;
+    dlp::test::ChildProcess office{"com.hancom.office.viewer"};
+    dlp::test::ChildProcess notes{"org.example.notes"};
+    dlp::test::ChildProcess fileManager{"com.vux.android.app.filbrook"};
 
-void FileOpenOfUnprotectedFile(benchmark::State& state) {
-    ScratchFile file("plain.pdf");
-    for (auto _ : state) benchmark::DoNotOptimize(addOrUpdateMapEntry(4243, file.path()));
-}
-BENCHMARK(FileOpenOfUnprotectedFile);
+    long protectedExpiry = start + kWeekSeconds;
+    std::string protectedFile = directory.stampedFile("protected.docx", protectedExpiry);
+    std::string plainFile = directory.file("plain.docx");
 
-// A whitelisted app is named from /proc on every create; the inherited expiry is written.
-void NewFileInheritedByWhitelistedApp(benchmark::State& state) {
-    dlp::test::ChildProcess office("com.hancom.office.editor");
-    ScratchFile opened("opened.docx");
-    ScratchFile created("created.doc");
-    set_dlp_file_expiry_time(opened.path(), time(nullptr) + 3600);
-    addOrUpdateMapEntry(office.pid(), opened.path());
-    for (auto _ : state) {
-        benchmark::DoNotOptimize(setExpiryforFile(office.pid(), created.path(), kContainerId));
+    long officeOpenedExpiry = start + kWeekSeconds + 1;
+    std::string officeOpened = directory.stampedFile("report.docx", officeOpenedExpiry);
+    std::string officeCreated = directory.file("report-copy.doc");
+
+    std::string notesOpened = directory.stampedFile("notes.docx", start + kWeekSeconds + 2);
+    std::string notesCreated = directory.file("notes-copy.doc");
+
+    std::string archiveOpened = directory.file("bundle.zip");
+    std::string archiveCreated = directory.file("bundle-copy.zip");
+};
+
+Scene* scene = nullptr;
+
+std::string processCommandLinePath(pid_t pid) {
+    return "/proc/" + std::to_string(pid) + "/cmdline";
+}
+
+// What the library reads to name a process: open, one read of at most 254 bytes, close.
+ssize_t readCommandLine(const char* path, char (&buffer)[255]) {
+    android::base::unique_fd file(open(path, O_RDONLY | O_CLOEXEC));
+    return read(file.get(), buffer, sizeof(buffer) - 1);
+}
+
+bool commandLineNames(const std::string& path, const char* name) {
+    char buffer[255] = {};
+    ssize_t length = readCommandLine(path.c_str(), buffer);
+    return length > 0 && strcmp(buffer, name) == 0;
+}
+
+// Command 4, exactly as callers send it.
+void fileOpen(benchmark::State& state, LogConfiguration configuration, bool isProtected) {
+    dlp::benchmarks::useProcessMapPopulation(0);
+    applyLogConfiguration(configuration);
+    pid_t pid = getpid();
+    CommandVector fileOpenCommand(
+            {"4", "0", std::to_string(pid), isProtected ? scene->protectedFile : scene->plainFile});
+    forgetProcess(pid);
+    if (fileOpenCommand.run() != 0) return state.SkipWithError("command 4 failed");
+    if (isProtected && !storedLast(pid, "docx", scene->protectedExpiry)) {
+        return state.SkipWithError("command 4 stored no entry for the protected file");
     }
-    mProcessMap.remove(office.pid());
-}
-BENCHMARK(NewFileInheritedByWhitelistedApp);
-
-// A rejected app is answered from the reject list; the duration comes from the cache.
-void NewFileOfOtherApp(benchmark::State& state) {
-    dlp::test::ChildProcess other("org.example.viewer");
-    ScratchFile opened("viewed.pdf");
-    ScratchFile created("saved.pdf");
-    set_expiryAfter_time(kContainerId, 86400);
-    set_dlp_file_expiry_time(opened.path(), time(nullptr) + 3600);
-    addOrUpdateMapEntry(other.pid(), opened.path());
-    for (auto _ : state) {
-        benchmark::DoNotOptimize(setExpiryforFile(other.pid(), created.path(), kContainerId));
+    if (!isProtected && hasEntries(pid)) {
+        return state.SkipWithError("command 4 stored an entry for an unprotected file");
     }
-    mProcessMap.remove(other.pid());
+    for (auto _ : state) benchmark::DoNotOptimize(fileOpenCommand.run());
 }
-BENCHMARK(NewFileOfOtherApp);
 
-// Lookup cost and heap held with many tracked processes, five entries each.
-void LookupAmongTrackedProcesses(benchmark::State& state) {
-    const int processes = static_cast<int>(state.range(0));
-    const char* extensions[] = {"pdf", "docx", "xlsx", "pptx", "jpg"};
-    size_t heapBefore = mallinfo2().uordblks;
-    for (int pid = 100000; pid < 100000 + processes; ++pid) {
-        for (const char* extension : extensions) {
-            mProcessMap.put(pid, MapEntry{pid, extension, time(nullptr) + 3600, time(nullptr)});
+void fileOpenFloor(benchmark::State& state, bool isProtected) {
+    const char* path = (isProtected ? scene->protectedFile : scene->plainFile).c_str();
+    ExpiryValue value{};
+    ssize_t expected = isProtected ? static_cast<ssize_t>(kExpiryValueSize) : -1;
+    if (getxattr(path, kExpiryAttribute, value.data(), value.size()) != expected) {
+        return state.SkipWithError("getxattr did not answer as the case's file should");
+    }
+    state.SetLabel("getxattr");
+    for (auto _ : state) {
+        benchmark::DoNotOptimize(getxattr(path, kExpiryAttribute, value.data(), value.size()));
+    }
+}
+
+// The office app opened a protected docx and now creates a doc: it inherits the docx's expiry.
+void inheritingCreate(benchmark::State& state, LogConfiguration configuration) {
+    dlp::benchmarks::useProcessMapPopulation(0);
+    applyLogConfiguration(configuration);
+    pid_t pid = scene->office.pid();
+    std::string created = scene->officeCreated;
+    forgetProcess(pid);
+    runCommand({"4", "0", std::to_string(pid), scene->officeOpened});
+    if (!storedLast(pid, "docx", scene->officeOpenedExpiry)) {
+        return state.SkipWithError("the office app's docx was not recorded");
+    }
+    removexattr(created.c_str(), kExpiryAttribute);
+    if (setExpiryforFile(pid, created.data(), kContainerId) != 0 ||
+        storedExpiry(created) != scene->officeOpenedExpiry || isRejected(pid)) {
+        return state.SkipWithError("the new doc did not inherit the docx's expiry");
+    }
+    for (auto _ : state) {
+        benchmark::DoNotOptimize(setExpiryforFile(pid, created.data(), kContainerId));
+    }
+}
+
+void inheritingCreateFloor(benchmark::State& state) {
+    std::string commandLine = processCommandLinePath(scene->office.pid());
+    const char* created = scene->officeCreated.c_str();
+    ExpiryValue value = expiryValue(scene->officeOpenedExpiry);
+    char name[255];
+    if (!commandLineNames(commandLine, "com.hancom.office.viewer") ||
+        setxattr(created, kExpiryAttribute, value.data(), value.size(), 0) != 0) {
+        return state.SkipWithError("the floor's system calls failed");
+    }
+    state.SetLabel("/proc read + setxattr");
+    for (auto _ : state) {
+        benchmark::DoNotOptimize(readCommandLine(commandLine.c_str(), name));
+        benchmark::DoNotOptimize(
+                setxattr(created, kExpiryAttribute, value.data(), value.size(), 0));
+    }
+}
+
+// An ordinary app, already on the reject list, creates a file: now + the cached duration.
+void rejectedCreate(benchmark::State& state, LogConfiguration configuration) {
+    dlp::benchmarks::useProcessMapPopulation(0);
+    applyLogConfiguration(configuration);
+    pid_t pid = scene->notes.pid();
+    std::string created = scene->notesCreated;
+    forgetProcess(pid);
+    runCommand({"4", "0", std::to_string(pid), scene->notesOpened});
+    setExpiryforFile(pid, created.data(), kContainerId);
+    if (!isRejected(pid)) return state.SkipWithError("the app was not put on the reject list");
+    {
+        DatabaseAside aside;
+        if (!aside.moved()) return state.SkipWithError("cannot move the database aside");
+        long before = getCurrentTimeInSec();
+        int result = setExpiryforFile(pid, created.data(), kContainerId);
+        long after = getCurrentTimeInSec();
+        long expiry = storedExpiry(created);
+        if (result != 0 || expiry < before + kDurationSeconds ||
+            expiry > after + kDurationSeconds) {
+            return state.SkipWithError("the new file did not get now + the cached duration");
         }
     }
-    size_t heapAfter = mallinfo2().uordblks;
-    int pid = 100000;
     for (auto _ : state) {
-        benchmark::DoNotOptimize(mProcessMap.get(pid, "doc"));
-        if (++pid == 100000 + processes) pid = 100000;
-    }
-    state.counters["heap_bytes_per_entry"] =
-            static_cast<double>(heapAfter - heapBefore) / (processes * 5.0);
-    for (int removed = 100000; removed < 100000 + processes; ++removed) {
-        mProcessMap.remove(removed);
+        benchmark::DoNotOptimize(setExpiryforFile(pid, created.data(), kContainerId));
     }
 }
-BENCHMARK(LookupAmongTrackedProcesses)->Arg(100)->Arg(10000);
+
+void rejectedCreateFloor(benchmark::State& state) {
+    const char* created = scene->notesCreated.c_str();
+    ExpiryValue value = expiryValue(getCurrentTimeInSec() + kDurationSeconds);
+    if (setxattr(created, kExpiryAttribute, value.data(), value.size(), 0) != 0) {
+        return state.SkipWithError("setxattr failed");
+    }
+    state.SetLabel("setxattr");
+    for (auto _ : state) {
+        benchmark::DoNotOptimize(
+                setxattr(created, kExpiryAttribute, value.data(), value.size(), 0));
+    }
+}
+
+// The file manager writes a zip after opening a protected zip: the new zip takes its expiry.
+void zipCopy(benchmark::State& state, LogConfiguration configuration) {
+    dlp::benchmarks::useProcessMapPopulation(0);
+    applyLogConfiguration(configuration);
+    pid_t pid = scene->fileManager.pid();
+    std::string created = scene->archiveCreated;
+    long openedExpiry = getCurrentTimeInSec() + kZipCopyWindowSeconds;
+    writeExpiry(scene->archiveOpened, openedExpiry);
+    forgetProcess(pid);
+    runCommand({"4", "0", std::to_string(pid), scene->archiveOpened});
+    if (!storedLast(pid, "zip", openedExpiry)) {
+        return state.SkipWithError("the file manager's zip was not recorded");
+    }
+    removexattr(created.c_str(), kExpiryAttribute);
+    if (setExpiryforFile(pid, created.data(), kContainerId) != 0 ||
+        storedExpiry(created) != openedExpiry) {
+        return state.SkipWithError("the new zip did not take the opened zip's expiry");
+    }
+    for (auto _ : state) {
+        benchmark::DoNotOptimize(setExpiryforFile(pid, created.data(), kContainerId));
+    }
+    if (getCurrentTimeInSec() > openedExpiry) {
+        state.SkipWithError("ran past the opened zip's expiry: later calls left the file alone");
+    }
+}
+
+void zipCopyFloor(benchmark::State& state) {
+    std::string commandLine = processCommandLinePath(scene->fileManager.pid());
+    const char* created = scene->archiveCreated.c_str();
+    ExpiryValue value = expiryValue(getCurrentTimeInSec() + kZipCopyWindowSeconds);
+    ExpiryValue current{};
+    char name[255];
+    if (!commandLineNames(commandLine, "com.vux.android.app.filbrook") ||
+        setxattr(created, kExpiryAttribute, value.data(), value.size(), 0) != 0 ||
+        getxattr(created, kExpiryAttribute, current.data(), current.size()) !=
+                static_cast<ssize_t>(kExpiryValueSize)) {
+        return state.SkipWithError("the floor's system calls failed");
+    }
+    state.SetLabel("/proc read + getxattr + setxattr");
+    for (auto _ : state) {
+        benchmark::DoNotOptimize(readCommandLine(commandLine.c_str(), name));
+        benchmark::DoNotOptimize(
+                getxattr(created, kExpiryAttribute, current.data(), current.size()));
+        benchmark::DoNotOptimize(
+                setxattr(created, kExpiryAttribute, value.data(), value.size(), 0));
+    }
+}
+
+void cachedDuration(benchmark::State& state, LogConfiguration configuration) {
+    applyLogConfiguration(configuration);
+    {
+        DatabaseAside aside;
+        if (!aside.moved()) return state.SkipWithError("cannot move the database aside");
+        if (get_time(kContainerId) != kDurationSeconds) {
+            return state.SkipWithError("the duration did not come from the cache");
+        }
+    }
+    for (auto _ : state) benchmark::DoNotOptimize(get_time(kContainerId));
+}
+
+int durationSlots[100];
+
+// Kept out of line so that the floor pays for a call, as the case does.
+[[gnu::noinline]] int durationSlot(int id) {
+    return durationSlots[id - 100];
+}
+
+void cachedDurationFloor(benchmark::State& state) {
+    durationSlots[kContainerId - 100] = kDurationSeconds;
+    volatile int id = kContainerId;
+    state.SetLabel("call reading an array slot");
+    for (auto _ : state) benchmark::DoNotOptimize(durationSlot(id));
+}
+
+// HashMap::get as setExpiryforFile calls it: on mProcessMap, under the library lock.
+void mapLookup(benchmark::State& state, LogConfiguration configuration, int processCount,
+               const std::string& extension) {
+    const auto& population = dlp::benchmarks::useProcessMapPopulation(processCount);
+    applyLogConfiguration(configuration);
+    const std::vector<int>& pids = population.lookupOrder;
+    {
+        dlp::LibraryLockGuard guard;
+        MapEntry found = mProcessMap.get(pids.front(), extension);
+        if (found.value_pid != pids.front() || found.value_extension != "docx") {
+            return state.SkipWithError("HashMap::get did not find the pid's docx");
+        }
+    }
+    size_t next = 0;
+    for (auto _ : state) {
+        int pid = pids[next];
+        if (++next == pids.size()) next = 0;
+        dlp::LibraryLockGuard guard;
+        benchmark::DoNotOptimize(mProcessMap.get(pid, extension));
+    }
+    state.counters["heap_bytes_per_entry"] = population.heapBytesPerEntry;
+}
+
+void mapLookupFloor(benchmark::State& state, int processCount) {
+    const auto& population = dlp::benchmarks::useProcessMapPopulation(processCount);
+    const std::vector<int>& pids = population.lookupOrder;
+    auto& map = HashMap::mInternalProcessMap;
+    if (map.find(pids.front()) == map.end()) return state.SkipWithError("the pid is not mapped");
+    state.SetLabel("std::map::find");
+    size_t next = 0;
+    for (auto _ : state) {
+        int pid = pids[next];
+        if (++next == pids.size()) next = 0;
+        benchmark::DoNotOptimize(map.find(pid));
+    }
+}
+
+using LibraryCase = std::function<void(benchmark::State&, LogConfiguration)>;
+using Floor = std::function<void(benchmark::State&)>;
+
+// The floor first, then the case under each log configuration: NAME/floor, NAME/silenced, ...
+void registerCase(const std::string& name, const LibraryCase& libraryCase, const Floor& floor) {
+    benchmark::RegisterBenchmark((name + "/floor").c_str(), floor);
+    for (LogConfiguration configuration : dlp::benchmarks::kLogConfigurations) {
+        std::string fullName = name + "/" + dlp::benchmarks::logConfigurationName(configuration);
+        benchmark::RegisterBenchmark(fullName.c_str(), libraryCase, configuration);
+    }
+}
+
+void registerCases() {
+    using std::placeholders::_1;
+    using std::placeholders::_2;
+    registerCase("command4_protected", std::bind(fileOpen, _1, _2, true),
+                 std::bind(fileOpenFloor, _1, true));
+    registerCase("command4_unprotected", std::bind(fileOpen, _1, _2, false),
+                 std::bind(fileOpenFloor, _1, false));
+    registerCase("create_inheriting", inheritingCreate, inheritingCreateFloor);
+    registerCase("create_rejected", rejectedCreate, rejectedCreateFloor);
+    registerCase("create_zip_copy", zipCopy, zipCopyFloor);
+    registerCase("get_time_cached", cachedDuration, cachedDurationFloor);
+    for (const char* extension : {"docx", "doc"}) {
+        for (int processCount : kProcessCounts) {
+            std::string name =
+                    std::string(extension) == "docx" ? "map_get_exact/" : "map_get_related/";
+            name += std::to_string(processCount);
+            registerCase(name, std::bind(mapLookup, _1, _2, processCount, std::string(extension)),
+                         std::bind(mapLookupFloor, _1, processCount));
+        }
+    }
+}
 
 }  // namespace
 
 int main(int argc, char** argv) {
-    __android_log_set_logger(discardMessage);
-    __android_log_set_minimum_priority(ANDROID_LOG_VERBOSE);
+    dlp::benchmarks::rememberStartingLogSettings();
     benchmark::Initialize(&argc, argv);
-    benchmark::RunSpecifiedBenchmarks();
+    if (benchmark::ReportUnrecognizedArguments(argc, argv)) return 2;
+    if (!databaseDirectoryIsThrowaway()) {
+        printf("/data/system/users is not a throwaway tmpfs: run inside tools/dlp-sandbox\n");
+        return 77;
+    }
+    try {
+        Scene built;
+        scene = &built;
+        if (runCommand({"3", std::to_string(kContainerId), std::to_string(kDurationSeconds)}) !=
+            0) {
+            printf("command 3 could not store the container's duration\n");
+            return 1;
+        }
+        // Building a population starts threads, and glibc leaves its single-threaded shortcuts
+        // for good once a process has had a second thread: every case runs after that, as in
+        // the library's multi-threaded callers.
+        for (int processCount : kProcessCounts) {
+            dlp::benchmarks::useProcessMapPopulation(processCount);
+        }
+        dlp::benchmarks::useProcessMapPopulation(0);
+        registerCases();
+        benchmark::RunSpecifiedBenchmarks();
+        scene = nullptr;
+    } catch (const std::exception& error) {
+        printf("cannot set the benchmark up: %s\n", error.what());
+        return 1;
+    }
     benchmark::Shutdown();
     return 0;
 }
