@@ -10,6 +10,7 @@
 #include "primitives/path_extension.h"
 #include "primitives/platform_log.h"
 #include "processmap/entry_store.h"
+#include "processmap/process_classification.h"
 #include "processmap/process_map_internal.h"
 #include "store/expiry_after_table.h"
 
@@ -74,9 +75,10 @@ int stampZipCopy(int pid, const char* path, long now) {
     return 0;
 }
 
-bool isNewFileCaseLocked(MapEntry entry, long currentTime, int pid) REQUIRES(dlp::libraryLock) {
+bool isNewFileCaseLocked(const MapEntry& entry, long currentTime, int pid)
+        REQUIRES(dlp::libraryLock) {
     long openTime = entry.value_opentime;
-    if (mProcessMap.isRejectedPid(pid, std::move(entry))) {
+    if (dlp::isRejectedProcess(mProcessMap, pid, entry)) {
         DLP_SYSTEM_DEBUG(
                 "DLP_LIBDLP : <isNewFileCase> pid[%d] passed is in reject list do new file case",
                 pid);
@@ -108,11 +110,9 @@ int setExpiryforFile(int pid, char* path, int containerId) {
     long newFileExpiry = 0;
     {
         dlp::LibraryLockGuard guard;
-        related = mProcessMap.get(pid, extension);
+        related = mProcessMap.get(pid, std::move(extension));
         if (related.value_pid == pid && related.value_expiry != dlp::kNoExpiry) {
-            MapEntry candidate = related;
-            candidate.value_pid = pid;
-            inherits = !isNewFileCaseLocked(std::move(candidate), callTime, pid);
+            inherits = !isNewFileCaseLocked(related, callTime, pid);
             // Read after the classification, which may just have recorded the file manager.
             fileManagerCase = mProcessMap.mFileManagerPid == pid ||
                               related.value_extension == dlp::kUnpackedFromZipExtension;
@@ -144,5 +144,5 @@ int setExpiryforFile(int pid, char* path, int containerId) {
 
 bool isNewFileCase(MapEntry entry, char* /*path*/, long currentTime, int pid) {
     dlp::LibraryLockGuard guard;
-    return isNewFileCaseLocked(std::move(entry), currentTime, pid);
+    return isNewFileCaseLocked(entry, currentTime, pid);
 }

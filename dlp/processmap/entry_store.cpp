@@ -18,7 +18,7 @@ bool HashMap::put(int key, MapEntry value) {
                 static_cast<int>(value.value_expiry));
         return false;
     }
-    if (isValidExtension(value.value_extension) == 0) {
+    if (!dlp::isProtectedExtension(*this, value.value_extension)) {
         DLP_SYSTEM_ERROR(
                 "DLP_LIBDLP : <HashMap::put> extension passed is not valid. ignoring add to map");
         return false;
@@ -44,7 +44,7 @@ bool HashMap::put(int key, MapEntry value) {
 MapEntry HashMap::get(int key, std::string extension) {
     DLP_SYSTEM_DEBUG("DLP_LIBDLP : <HashMap::get> key[%d], value.value_extension[%s]", key,
                      extension.c_str());
-    if (isValidExtension(extension) == 0) return dlp::emptyMapEntry();
+    if (!dlp::isProtectedExtension(*this, extension)) return dlp::emptyMapEntry();
     mMapIterator = mInternalProcessMap.find(key);
     if (mMapIterator == mInternalProcessMap.end()) {
         DLP_SYSTEM_DEBUG("DLP_LIBDLP : <HashMap::get> record with key[%d] not found.", key);
@@ -53,7 +53,7 @@ MapEntry HashMap::get(int key, std::string extension) {
     const std::vector<MapEntry>& entries = mMapIterator->second;
 
     // A zip that the file manager opened last is what it is unpacking or copying now.
-    if (entries.back().value_extension == "zip" &&
+    if (entries.back().value_extension == std::string_view("zip") &&
         getProcessNameByPid(key) == FILE_MANAGER_PACKAGE) {
         MapEntry result = entries.back();
         result.value_extension = dlp::kUnpackedFromZipExtension;

@@ -1,33 +1,71 @@
 #include "processmap/extension_rules.h"
 
 #include <algorithm>
+#include <array>
+#include <cstdint>
 #include <utility>
 
 #include "primitives/platform_log.h"
 
 namespace dlp {
 
-const char* const kBuiltInExtensions[25] = {"xls", "xlsx",     "doc", "docx", "ppt", "pptx", "pdf",
-                                            "jpg", "jpeg",     "mp4", "zip",  "txt", "asd",  "xlam",
-                                            "htm", "html",     "mht", "eml",  "msg", "hwp",  "gul",
-                                            "rtf", "ostrilex", "png", "gif"};
+constexpr const char* kBuiltInExtensions[25] = {
+        "xls", "xlsx", "doc", "docx", "ppt",      "pptx", "pdf",  "jpg", "jpeg",
+        "mp4", "zip",  "txt", "asd",  "xlam",     "htm",  "html", "mht", "eml",
+        "msg", "hwp",  "gul", "rtf",  "ostrilex", "png",  "gif"};
 
 }  // namespace dlp
 
 namespace {
 
-bool contains(const std::vector<std::string>& list, const std::string& extension) {
-    return std::find(list.begin(), list.end(), extension) != list.end();
+// No built-in extension is longer than eight bytes, so each one packs, with its length, into a
+// key: the built-ins are told by a binary search instead of 25 string comparisons.
+struct PackedExtension {
+    size_t size;
+    uint64_t bytes;
+};
+
+constexpr bool operator<(const PackedExtension& left, const PackedExtension& right) {
+    return left.size != right.size ? left.size < right.size : left.bytes < right.bytes;
+}
+
+constexpr size_t kLongestBuiltInExtension = 8;
+constexpr size_t kBuiltInCount = std::size(dlp::kBuiltInExtensions);
+
+constexpr PackedExtension pack(std::string_view extension) {
+    uint64_t bytes = 0;
+    for (char byte : extension) bytes = bytes << 8 | static_cast<unsigned char>(byte);
+    return {extension.size(), bytes};
+}
+
+constexpr std::array<PackedExtension, kBuiltInCount> sortedPackedBuiltIns() {
+    std::array<PackedExtension, kBuiltInCount> sorted{};
+    for (size_t i = 0; i < kBuiltInCount; ++i) {
+        PackedExtension value = pack(dlp::kBuiltInExtensions[i]);
+        size_t slot = i;
+        for (; slot > 0 && value < sorted[slot - 1]; --slot) sorted[slot] = sorted[slot - 1];
+        sorted[slot] = value;
+    }
+    return sorted;
+}
+
+constexpr std::array<PackedExtension, kBuiltInCount> kPackedBuiltIns = sortedPackedBuiltIns();
+
+bool isBuiltIn(std::string_view extension) {
+    return extension.size() <= kLongestBuiltInExtension &&
+           std::binary_search(kPackedBuiltIns.begin(), kPackedBuiltIns.end(), pack(extension));
 }
 
 }  // namespace
 
 int HashMap::isValidExtension(std::string extension) {
-    return contains(mDefaultExtensions, extension) || contains(mExtensionList, extension) ? 1 : 0;
+    return dlp::isProtectedExtension(*this, extension) ? 1 : 0;
 }
 
 int HashMap::addExtension(std::string extension) {
-    if (isValidExtension(extension) == 0) mExtensionList.push_back(std::move(extension));
+    if (!dlp::isProtectedExtension(*this, extension)) {
+        mExtensionList.push_back(std::move(extension));
+    }
     return 1;
 }
 
@@ -76,6 +114,11 @@ int HashMap::getValidMapEntryIndexForExt(std::string extension, std::vector<MapE
 }
 
 namespace dlp {
+
+bool isProtectedExtension(const HashMap& map, std::string_view extension) {
+    return isBuiltIn(extension) || std::find(map.mExtensionList.begin(), map.mExtensionList.end(),
+                                             extension) != map.mExtensionList.end();
+}
 
 void replaceExtensionList(std::vector<std::string> extensions) {
     mProcessMap.mExtensionList.clear();

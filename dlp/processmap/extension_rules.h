@@ -3,6 +3,7 @@
 #include <dlp_sdk/process_map.h>
 
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "primitives/library_lock.h"
@@ -14,6 +15,10 @@ extern const char* const kBuiltInExtensions[25];
 
 // getValidMapEntryIndexForExt when no entry has a related extension.
 constexpr int kNoEntryIndex = -2;
+
+// HashMap::isValidExtension without a copy of the extension: it runs on every file open and
+// create.
+bool isProtectedExtension(const HashMap& map, std::string_view extension) REQUIRES(libraryLock);
 
 // Command 5: the administrator's list becomes `extensions`, less duplicates and built-ins.
 void replaceExtensionList(std::vector<std::string> extensions) REQUIRES(libraryLock);
