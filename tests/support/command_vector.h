@@ -7,14 +7,13 @@
 
 namespace dlp::test {
 
-// Runs one command vector as the framework sends it, behind argv[0], which is never read.
-inline int runCommand(std::vector<std::string> words,
-                      int (*handler)(int, char**) = handleDLPCommands) {
+// Runs one command vector as the file-event source sends it, behind argv[0], which is not read.
+inline int runCommand(std::vector<std::string> words) {
     words.insert(words.begin(), "dlp");
     std::vector<char*> argv;
     for (std::string& word : words) argv.push_back(word.data());
     argv.push_back(nullptr);
-    return handler(static_cast<int>(words.size()), argv.data());
+    return handleDLPCommands(static_cast<int>(words.size()), argv.data());
 }
 
 }  // namespace dlp::test

@@ -6,13 +6,13 @@
 
 namespace dlp::test {
 
-bool databaseDirectoryIsThrowaway() {
+bool databaseIsThrowaway() {
     struct statfs fileSystem {};
     return statfs("/data/system/users", &fileSystem) == 0 && fileSystem.f_type == TMPFS_MAGIC;
 }
 
-DurationDatabase::DurationDatabase(int flags) {
-    EXPECT_EQ(sqlite3_open_v2(kDatabasePath, &handle_, flags, nullptr), SQLITE_OK);
+DurationDatabase::DurationDatabase() {
+    EXPECT_EQ(sqlite3_open_v2(kDatabasePath, &handle_, SQLITE_OPEN_READWRITE, nullptr), SQLITE_OK);
 }
 
 int DurationDatabase::execute(const std::string& sql) {
@@ -28,16 +28,6 @@ std::vector<std::pair<int, int>> DurationDatabase::rows(const std::string& where
     while (statement != nullptr && sqlite3_step(statement) == SQLITE_ROW) {
         found.emplace_back(sqlite3_column_int(statement, 0), sqlite3_column_int(statement, 1));
     }
-    sqlite3_finalize(statement);
-    return found;
-}
-
-bool DurationDatabase::hasTable(const std::string& name) {
-    sqlite3_stmt* statement = nullptr;
-    sqlite3_prepare_v2(handle_, "SELECT 1 FROM sqlite_master WHERE type = 'table' AND name = ?", -1,
-                       &statement, nullptr);
-    sqlite3_bind_text(statement, 1, name.c_str(), -1, SQLITE_TRANSIENT);
-    bool found = sqlite3_step(statement) == SQLITE_ROW;
     sqlite3_finalize(statement);
     return found;
 }

@@ -2,17 +2,23 @@
 
 #include <gtest/gtest.h>
 #include <stdlib.h>
+#include <sys/xattr.h>
 
 #include <cerrno>
 #include <filesystem>
 #include <fstream>
 
-#include "support/expiry_attribute_bytes.h"
-
 namespace dlp::test {
 
+namespace {
+
+constexpr const char* kExpiryAttribute = "user.zorvat_dlp";
+
+}  // namespace
+
 ScratchDirectory::ScratchDirectory() {
-    std::string pattern = std::filesystem::temp_directory_path() / "dlp-test-XXXXXX";
+    // The build tree: a tmpfs /tmp may refuse user attributes.
+    std::string pattern = std::filesystem::current_path() / "scratch-XXXXXX";
     if (mkdtemp(pattern.data()) == nullptr) ADD_FAILURE() << "mkdtemp: errno " << errno;
     path_ = pattern;
 }
@@ -22,23 +28,39 @@ ScratchDirectory::~ScratchDirectory() {
     std::filesystem::remove_all(path_, ignored);
 }
 
-std::string ScratchDirectory::file(const std::string& name) const {
+std::string ScratchDirectory::file(const std::string& name, std::optional<int64_t> expiry) const {
     std::filesystem::path path = std::filesystem::path(path_) / name;
     std::filesystem::create_directories(path.parent_path());
     std::ofstream{path};
+    if (expiry) writeAttribute(path, expiryValue(*expiry));
     return path;
 }
 
-std::string ScratchDirectory::stampedFile(const std::string& name, int64_t expiry) const {
-    std::string path = file(name);
-    writeExpiryAttribute(path, expiry);
-    return path;
+std::vector<unsigned char> readAttribute(const std::string& path) {
+    std::vector<unsigned char> value(64);
+    ssize_t size = getxattr(path.c_str(), kExpiryAttribute, value.data(), value.size());
+    value.resize(size < 0 ? 0 : size);
+    return value;
 }
 
-std::string ScratchDirectory::unwritableFile(const std::string& name) const {
-    std::string path = std::filesystem::path(path_) / name;
-    std::filesystem::create_symlink("/proc/self/comm", path);
-    return path;
+void writeAttribute(const std::string& path, const std::vector<unsigned char>& value) {
+    EXPECT_EQ(setxattr(path.c_str(), kExpiryAttribute, value.data(), value.size(), 0), 0)
+            << path << ": errno " << errno;
+}
+
+std::vector<unsigned char> expiryValue(int64_t expiry) {
+    std::vector<unsigned char> value(16, 0);
+    for (int i = 0; i < 8; ++i) value[i] = static_cast<unsigned char>(uint64_t(expiry) >> (8 * i));
+    return value;
+}
+
+std::optional<int64_t> readExpiry(const std::string& path) {
+    std::vector<unsigned char> value = readAttribute(path);
+    if (value.empty()) return {};
+    EXPECT_EQ(value.size(), 16u) << path;
+    uint64_t bits = 0;
+    for (size_t i = 0; i < 8 && i < value.size(); ++i) bits |= uint64_t(value[i]) << (8 * i);
+    return static_cast<int64_t>(bits);
 }
 
 }  // namespace dlp::test

@@ -1,12 +1,14 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
+#include <vector>
 
 namespace dlp::test {
 
-// A directory of its own under the temporary directory, removed with its content. Its path holds
-// no ".", since the library takes the extension from the whole path.
+// A directory of its own, removed with its content. Its path holds no ".", since the library
+// takes the extension from the whole path.
 class ScratchDirectory {
   public:
     ScratchDirectory();
@@ -15,15 +17,19 @@ class ScratchDirectory {
     ScratchDirectory& operator=(const ScratchDirectory&) = delete;
 
     const std::string& path() const { return path_; }
-    // Creates an empty file (and its directories) and returns its path.
-    std::string file(const std::string& name) const;
-    // The same, carrying the expiry attribute.
-    std::string stampedFile(const std::string& name, int64_t expiry) const;
-    // A link whose target refuses user attributes: every write through it fails.
-    std::string unwritableFile(const std::string& name) const;
+    // An empty file (and its directories), carrying `expiry` when one is given.
+    std::string file(const std::string& name, std::optional<int64_t> expiry = {}) const;
 
   private:
     std::string path_;
 };
+
+// The attribute "user.zorvat_dlp" as the kernel keeps it, without the library: raw bytes, or
+// the 16-byte value with the expiry little-endian in bytes 0-7.
+std::vector<unsigned char> readAttribute(const std::string& path);
+void writeAttribute(const std::string& path, const std::vector<unsigned char>& value);
+std::vector<unsigned char> expiryValue(int64_t expiry);
+// The expiry a 16-byte value holds; nothing when the file carries no attribute.
+std::optional<int64_t> readExpiry(const std::string& path);
 
 }  // namespace dlp::test

@@ -156,11 +156,14 @@ class TracePlayer {
         return std::to_string(runCommandVector(std::move(words)));
     }
 
+    // The process created PATH, so a replay away from the device makes it where it is missing.
     std::string create(const Arguments& words) {
         int pid = processes_.realPid(number(words[1]));
         int container = number(words[3]);
         std::string path = words[2];
-        return std::to_string(setExpiryforFile(pid, path.data(), container));
+        if (!std::filesystem::exists(path)) makeFile(path);
+        int result = setExpiryforFile(pid, path.data(), container);
+        return std::to_string(result) + " " + showResult(path);
     }
 
     std::string show(const Arguments& words) { return showResult(words[1]); }
@@ -179,16 +182,20 @@ class TracePlayer {
         return "exited";
     }
 
-    std::string file(const Arguments& words) {
-        const std::string& path = words[1];
-        std::optional<int64_t> stamp;
-        if (words.size() == 3) stamp = expiry(words[2]);
+    static void makeFile(const std::string& path) {
         std::filesystem::path parent = std::filesystem::path(path).parent_path();
         std::error_code ignored;
         if (!parent.empty()) std::filesystem::create_directories(parent, ignored);
         android::base::unique_fd created(
                 open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644));
         if (!created.ok()) throw FailedLine{"cannot create " + path + ": " + strerror(errno)};
+    }
+
+    std::string file(const Arguments& words) {
+        const std::string& path = words[1];
+        std::optional<int64_t> stamp;
+        if (words.size() == 3) stamp = expiry(words[2]);
+        makeFile(path);
         if (!stamp) return "created";
         if (set_dlp_file_expiry_time(path.c_str(), *stamp) != 0) {
             throw FailedLine{"cannot stamp " + path + ": " + strerror(errno)};

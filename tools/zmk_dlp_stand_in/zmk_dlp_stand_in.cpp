@@ -229,9 +229,16 @@ struct ArgumentsDeleter {
     void operator()(fuse_args* arguments) const { fuse_opt_free_args(arguments); }
 };
 
-int usage() {
-    fprintf(stderr, "usage: zmk_dlp_stand_in [--state-directory DIRECTORY] MOUNTPOINT\n");
-    return 2;
+int usage(FILE* out, int status) {
+    fprintf(out,
+            "usage: zmk_dlp_stand_in [--state-directory DIRECTORY] MOUNTPOINT\n"
+            "Serves the DLP device's three ioctl requests on MOUNTPOINT (a regular file, normally\n"
+            "/dev/zmk_dlp inside tools/dlp-sandbox) and records them in DIRECTORY "
+            "($DLP_DEVICE_STATE,\n"
+            "else /run/zmk_dlp): opens, requests, lock.<id>, extensions.<id>; a file \"fail\" "
+            "there,\n"
+            "lines \"0x<request> <errno>\", makes requests fail. Prints \"ready\" once mounted.\n");
+    return status;
 }
 
 }  // namespace
@@ -243,15 +250,16 @@ int main(int argc, char* argv[]) {
                              : kDefaultStateDirectory;
     const char* mountpoint = nullptr;
     for (int i = 1; i < argc; ++i) {
+        if (strcmp(argv[i], "--help") == 0) return usage(stdout, 0);
         if (strcmp(argv[i], "--state-directory") == 0 && i + 1 < argc) {
             stateDirectory = argv[++i];
         } else if (argv[i][0] != '-' && mountpoint == nullptr) {
             mountpoint = argv[i];
         } else {
-            return usage();
+            return usage(stderr, 2);
         }
     }
-    if (mountpoint == nullptr) return usage();
+    if (mountpoint == nullptr) return usage(stderr, 2);
     struct stat directory;
     if (stat(stateDirectory.c_str(), &directory) != 0 || !S_ISDIR(directory.st_mode)) {
         fprintf(stderr, "zmk_dlp_stand_in: %s is not a directory\n", stateDirectory.c_str());
