@@ -14,5 +14,7 @@ tools/check-format.sh
 tools/check-android-bp.sh "$build"
 tools/check-libcxx-exports.sh "$build"
 
-cd "$build"
-ctest --output-on-failure -j "$(nproc)"
+(cd "$build" && ctest --output-on-failure -j "$(nproc)")
+
+# Every hot-path benchmark once, briefly: it fails when a case no longer takes its road.
+DLP_BUILD_DIR=$build tools/benchmark.sh --quick >/dev/null

@@ -1,0 +1,13 @@
+#!/usr/bin/env bash
+# dlp-sandbox: the command's status passes through; inside, /data/system/users and /dev are the
+# namespace's own; its internal re-entry is refused to anyone else. Usage: dlp_sandbox_test.sh SANDBOX
+set -euo pipefail
+sandbox=$1 status=0
+"$sandbox" sh -c 'exit 3' || status=$?
+((status == 3)) || { echo "FAILED: status $status, not 3" >&2 && exit 1; }
+inside=$("$sandbox" sh -c 'stat -f -c %T /data/system/users /dev; touch /data/system/users/mark')
+[[ $inside == $'tmpfs\ntmpfs' ]] || { echo "FAILED: inside the sandbox: $inside" >&2 && exit 1; }
+[[ ! -e /data/system/users/mark ]] || { echo "FAILED: a file made inside reached the machine" >&2 && exit 1; }
+status=0
+"$sandbox" --in-namespace "" / true 2>/dev/null || status=$?
+((status == 2)) || { echo "FAILED: the internal option ran, status $status" >&2 && exit 1; }
