@@ -2,6 +2,7 @@ import static org.junit.jupiter.api.Assertions.*;
 
 import com.android.server.DLPManagerService;
 import com.halvorn.android.zorvat.dlp.XattrManager;
+import java.io.IOException;
 import java.nio.*;
 import java.nio.file.*;
 import org.junit.jupiter.api.Test;
@@ -23,12 +24,20 @@ class NativeMethodsTest {
     }
 
     @Test
-    void administratorSettingsReachTheLibrary() {
+    void administratorSettingsReachTheLibrary() throws IOException {
         assertTrue(DLPManagerService.Native_Dlp_SetDLPExpiry(150, 60));
         assertFalse(DLPManagerService.Native_Dlp_SetDLPExpiry(99, 60));
         assertTrue(DLPManagerService.Native_Dlp_SetDLPExtension(11, "doc,pdf"));
         assertFalse(DLPManagerService.Native_Dlp_SetDLPExtension(11, null));
-        assertTrue(DLPManagerService.Native_Dlp_LockDLP(11));
-        assertTrue(DLPManagerService.Native_Dlp_UnlockDLP(11));
+        assertEquals("doc,pdf", deviceState("extensions.11"));
+        assertTrue(DLPManagerService.Native_Dlp_LockDLP(12));
+        assertEquals("1", deviceState("lock.12"));
+        assertTrue(DLPManagerService.Native_Dlp_UnlockDLP(12));
+        assertEquals("0", deviceState("lock.12"));
+    }
+
+    /** What the device stand-in keeps of the requests it received. */
+    private static String deviceState(String name) throws IOException {
+        return Files.readString(Path.of(System.getenv("DLP_DEVICE_STATE"), name));
     }
 }

@@ -69,7 +69,7 @@ TEST(HashMap_get, TakesTheArchiveTheExactOrTheRelatedEntry) {
     const Fields empty{-1, "no_extension", -1, -1};
     EXPECT_EQ(fields(mProcessMap.get(3, "jpg")), empty);
     EXPECT_EQ(fields(mProcessMap.get(4, "pdf")), empty);
-    EXPECT_EQ(fields(mProcessMap.get(3, "PDF")), empty);
+    EXPECT_EQ(fields(mProcessMap.get(3, "tmp")), empty);
 }
 
 TEST(HashMap_remove, ForgetsTheEntriesTheRejectionAndTheFileManagerPid) {

@@ -51,7 +51,7 @@ TEST(HashMap_getValidMapEntryIndexForExt, FindsTheMostRecentRelatedEntry) {
     const std::tuple<const char*, const char*, int> rows[] = {
             {"doc", "docx pdf txt", 2}, {"doc", "docx docx", 1},     {"doc", "doc", -2},
             {"pdf", "pdf", -2},         {"tmp", "xlsx pdf pptx", 2}, {"xls", "pdf xlsx", 1},
-            {"xlsx", "xls pdf", 0},     {"jpg", "png gif pdf", 1},   {"doc", "", -2}};
+            {"xlsx", "xls pdf", 0},     {"jpg", "gif png pdf", 1},   {"doc", "", -2}};
     LogCapture log;
     for (auto [extension, opened, index] : rows) {
         std::vector<MapEntry> entries;

@@ -42,7 +42,7 @@ TEST(HashMap, EveryLoadStartsFromTheSameState) {
         EXPECT_EQ(map.mExtensionGroups.size(), 15u);
         EXPECT_TRUE(map.mExtensionList.empty() && map.mRejectList.empty());
         EXPECT_TRUE(entries.empty() && inodes.empty());
-        EXPECT_EQ(map.mLogState, 0);
+        EXPECT_EQ(symbol<int()>(library, "_Z19getDLPAuditLogStatev")(), 0);
         EXPECT_EQ(map.mFileManagerPid, -1);
         EXPECT_TRUE(symbol<ProcessEntries::iterator>(library, "_ZN7HashMap12mMapIteratorE") ==
                     ProcessEntries::iterator());
