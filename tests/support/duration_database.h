@@ -13,8 +13,8 @@ constexpr const char* kDatabasePath = "/data/system/users/dlp/dlpinfo.db";
 // The database path is fixed: tests that reach it run only where /data/system/users is the
 // sandbox's throwaway tmpfs, never against a real device's data.
 bool databaseIsThrowaway();
-#define SKIP_UNLESS_DATABASE_IS_THROWAWAY()                                                  \
-    if (!::dlp::test::databaseIsThrowaway()) {                                               \
+#define SKIP_UNLESS_DATABASE_IS_THROWAWAY()                                               \
+    if (!::dlp::test::databaseIsThrowaway()) {                                            \
         GTEST_SKIP() << "reaches /data/system/users: runs only inside tools/dlp-sandbox"; \
     }
 
