@@ -41,8 +41,8 @@ constexpr size_t slotOf(uint64_t bytes, uint64_t multiplier) {
 
 using SlotTable = std::array<PackedExtension, size_t{1} << kSlotBits>;
 
-// The first multiplier of a sequence of odd ones under which no two built-ins share a slot; a failed search stops the
-// build.
+// The first multiplier of a sequence of odd ones under which no two built-ins share a slot; a
+// failed search stops the build.
 constexpr uint64_t findMultiplier() {
     for (uint64_t multiplier = 0x9E3779B97F4A7C15u;; multiplier += 0xD6E8FEB86659FD94u) {
         SlotTable slots{};

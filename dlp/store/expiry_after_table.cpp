@@ -197,8 +197,7 @@ int setTimeLocked(int id, int time) {
 
 int getTimeLocked(int id) {
     if (!isValidId(id)) {
-        DLP_PRIMITIVE_LOG("DLP_LIBEPM : get_time : error : id : %d, index : %d\n", id,
-                          indexOf(id));
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : get_time : error : id : %d, index : %d\n", id, indexOf(id));
         return -1;
     }
     int& slot = expiry_after_cache[id - kFirstId];
