@@ -1,4 +1,4 @@
-# DLP_SANITIZE (e.g. address,undefined or thread) instruments everything built here; DLP_BUILD_FUZZERS
+# DLP_SANITIZE (address,undefined or thread) instruments everything built here; DLP_BUILD_FUZZERS
 # instruments it for libFuzzer instead. Both need clang. Included before any target is made.
 if(DLP_BUILD_FUZZERS)
   if(DLP_SANITIZE)
@@ -15,7 +15,7 @@ else()
 endif()
 
 if(NOT CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
-  message(FATAL_ERROR "DLP_SANITIZE and DLP_BUILD_FUZZERS need clang (-DCMAKE_CXX_COMPILER=clang++-14)")
+  message(FATAL_ERROR "DLP_SANITIZE and DLP_BUILD_FUZZERS need clang (clang++-14)")
 endif()
 add_compile_options(-fsanitize=${dlp_compile_sanitizers} -fno-sanitize-recover=all
   -fno-omit-frame-pointer -g)
@@ -32,7 +32,9 @@ if(dlp_link_sanitizers MATCHES "address" AND NOT DLP_BUILD_FUZZERS)
   # JVM maps its heap. LeakSanitizer crashes reading the JVM's thread-local storage and finds no
   # root for the JVM's own allocations; those are dropped by their nearest three frames, which
   # keeps the library's leaks in view.
-  set(DLP_SANITIZED_JVM env LD_PRELOAD=${asan_runtime} LSAN_OPTIONS=use_tls=0:malloc_context_size=3:suppressions=${PROJECT_SOURCE_DIR}/tools/sanitizers/jvm-leaks.supp)
+  string(JOIN : jvm_leak_options use_tls=0 malloc_context_size=3
+    suppressions=${PROJECT_SOURCE_DIR}/tools/sanitizers/jvm-leaks.supp)
+  set(DLP_SANITIZED_JVM env LD_PRELOAD=${asan_runtime} LSAN_OPTIONS=${jvm_leak_options})
 else()
   # A static runtime comes with each executable; the shared library leaves its hooks undefined.
   set(DLP_SANITIZER_RUNTIME_IS_STATIC ON)
