@@ -9,6 +9,7 @@ packages=(
   libfuse3-dev fuse3 faketime util-linux mount attr
   openjdk-17-jdk-headless junit5
   clang lld libc++-dev libc++abi-dev blueprint-tools
+  clang-14 libclang-rt-14-dev llvm-14
 )
 
 missing=()

@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
 # The project's test command: installs what is missing, builds everything, checks the formatting,
-# Android.bp and a libc++ build's exports, and runs every test.
+# Android.bp and a libc++ build's exports, and runs every test, then again under sanitizers, and the
+# fuzzers (tools/sanitizers.sh).
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
@@ -18,3 +19,6 @@ tools/check-libcxx-exports.sh "$build"
 
 # Every hot-path benchmark once, briefly: it fails when a case no longer takes its road.
 DLP_BUILD_DIR=$build tools/benchmark.sh --quick >/dev/null
+
+# The tests again under sanitizers, and the fuzzers.
+tools/sanitizers.sh

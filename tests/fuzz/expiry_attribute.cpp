@@ -1,0 +1,46 @@
+// Any attribute value, read back: the expiry only from a 16-byte value holding a time above 0.
+#include <android/log.h>
+#include <dlp_sdk/expiry_attribute.h>
+#include <fcntl.h>
+#include <sys/xattr.h>
+#include <unistd.h>
+
+#include <cstdint>
+#include <cstdlib>
+#include <string>
+
+#include "fuzz/scratch_directory.h"
+
+namespace {
+
+const std::string& attributeFile() {
+    static const std::string path = [] {
+        std::string file = dlp::fuzz::scratchDirectory() + "/stamped";
+        int descriptor = open(file.c_str(), O_CREAT | O_WRONLY | O_CLOEXEC, 0600);
+        if (descriptor < 0) abort();
+        close(descriptor);
+        return file;
+    }();
+    return path;
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerInitialize(int*, char***) {
+    __android_log_set_logger([](const __android_logger_data*, const char*) {});
+    return 0;
+}
+
+extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
+    const char* file = attributeFile().c_str();
+    removexattr(file, "user.zorvat_dlp");
+    // Values the file system refuses (too long) leave the file without the attribute.
+    long expected = -1;
+    if (setxattr(file, "user.zorvat_dlp", data, size, 0) == 0 && size == 16) {
+        uint64_t bits = 0;
+        for (size_t i = 0; i < 8; ++i) bits |= static_cast<uint64_t>(data[i]) << (8 * i);
+        if (static_cast<long>(bits) > 0) expected = static_cast<long>(bits);
+    }
+    if (get_dlp_file_expiry_time(file) != expected) abort();
+    return 0;
+}
