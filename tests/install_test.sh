@@ -13,8 +13,7 @@ prefix=$work/prefix
 
 cmake --install "$build_dir" --prefix "$prefix" >/dev/null
 export PKG_CONFIG_PATH=$prefix/lib/pkgconfig
-pc_version=$(pkg-config --modversion dlp_sdk)
-[ "$pc_version" = "$version" ] || { echo "dlp_sdk.pc says version '$pc_version'" >&2; exit 1; }
+pkg-config --exact-version="$version" dlp_sdk || { echo "dlp_sdk.pc is not version $version" >&2; exit 1; }
 read -ra cflags < <(pkg-config --cflags dlp_sdk)
 read -ra libs < <(pkg-config --libs dlp_sdk)
 

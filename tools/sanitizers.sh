@@ -55,11 +55,12 @@ run_fuzzers() {
   for source in tests/fuzz/*.cpp; do
     harness=$(basename "$source" .cpp)
     run=$runs/$harness
-    mkdir -p "$run/corpus" "$run/tmp"
+    mkdir -p "$run/corpus"
     cp tests/fuzz/corpus/"$harness"/* "$run/corpus/"
-    if ! TMPDIR=$run/tmp tools/dlp-sandbox "$PWD/build-fuzz/tests/fuzz/${harness}_fuzzer" \
+    # Scratch files go to the harness's directory in the build tree.
+    if ! (cd "$run" && "$OLDPWD/tools/dlp-sandbox" "$OLDPWD/build-fuzz/tests/fuzz/${harness}_fuzzer" \
         -max_total_time="$fuzz_seconds" -rss_limit_mb=2048 -timeout=10 -print_final_stats=1 \
-        -artifact_prefix="$run/" "$run/corpus" >"$run/log" 2>&1; then
+        -artifact_prefix="$run/" "$run/corpus" >"$run/log" 2>&1); then
       tail -n 60 "$run/log" >&2
       echo "sanitizers: fuzzing $harness failed; the whole log is $run/log" >&2
       return 1

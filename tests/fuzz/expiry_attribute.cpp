@@ -1,30 +1,13 @@
 // Any attribute value, read back: the expiry only from a 16-byte value holding a time above 0.
 #include <android/log.h>
 #include <dlp_sdk/expiry_attribute.h>
-#include <fcntl.h>
 #include <sys/xattr.h>
-#include <unistd.h>
 
 #include <cstdint>
 #include <cstdlib>
 #include <string>
 
-#include "fuzz/scratch_directory.h"
-
-namespace {
-
-const std::string& attributeFile() {
-    static const std::string path = [] {
-        std::string file = dlp::fuzz::scratchDirectory() + "/stamped";
-        int descriptor = open(file.c_str(), O_CREAT | O_WRONLY | O_CLOEXEC, 0600);
-        if (descriptor < 0) abort();
-        close(descriptor);
-        return file;
-    }();
-    return path;
-}
-
-}  // namespace
+#include "support/scratch_directory.h"
 
 extern "C" int LLVMFuzzerInitialize(int*, char***) {
     __android_log_set_logger([](const __android_logger_data*, const char*) {});
@@ -32,7 +15,9 @@ extern "C" int LLVMFuzzerInitialize(int*, char***) {
 }
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-    const char* file = attributeFile().c_str();
+    static const dlp::test::ScratchDirectory directory;
+    static const std::string stamped = directory.file("stamped");
+    const char* file = stamped.c_str();
     removexattr(file, "user.zorvat_dlp");
     // Values the file system refuses (too long) leave the file without the attribute.
     long expected = -1;

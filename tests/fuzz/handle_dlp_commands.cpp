@@ -3,42 +3,19 @@
 // becomes a stamped file of the scratch directory whose name ends in the input's bytes.
 #include <android/log.h>
 #include <dlp_sdk/commands.h>
-#include <dlp_sdk/expiry_attribute.h>
-#include <fcntl.h>
 #include <linux/magic.h>
 #include <sys/statfs.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
+#include <sstream>
 #include <string>
 #include <vector>
 
-#include "fuzz/scratch_directory.h"
-
-namespace {
-
-constexpr size_t kMostArguments = 8;
-constexpr size_t kLongestArgument = 5000;
-
-std::string scratchFileEndingIn(const std::string& argument) {
-    std::string name = "file.";
-    for (char byte : argument) {
-        if (byte != '/') name += byte;
-    }
-    std::string path = dlp::fuzz::scratchDirectory() + "/" + name;
-    int descriptor = open(path.c_str(), O_CREAT | O_WRONLY | O_CLOEXEC, 0600);
-    if (descriptor >= 0) {
-        close(descriptor);
-        set_dlp_file_expiry_time(path.c_str(), time(nullptr) + 3600);
-    }
-    return path;
-}
-
-}  // namespace
+#include "support/scratch_directory.h"
 
 extern "C" int LLVMFuzzerInitialize(int*, char***) {
     struct statfs fileSystem {};
@@ -51,22 +28,21 @@ extern "C" int LLVMFuzzerInitialize(int*, char***) {
 }
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
+    static const dlp::test::ScratchDirectory directory;
     std::vector<std::string> arguments{"dlp"};
-    const char* cursor = reinterpret_cast<const char*>(data);
-    const char* end = cursor + size;
-    while (cursor < end && arguments.size() < kMostArguments) {
-        const char* next = std::find(cursor, end, '\n');
-        // An argument ends at its first NUL, as the library reads it.
-        std::string argument(cursor, std::min<size_t>(next - cursor, kLongestArgument));
-        arguments.emplace_back(argument.c_str());
-        cursor = next + 1;
+    std::istringstream lines(std::string(reinterpret_cast<const char*>(data), size));
+    // At most 8 arguments of 5000 bytes, each ending at its first NUL as the library reads it.
+    for (std::string line; arguments.size() < 8 && std::getline(lines, line);) {
+        arguments.emplace_back(line.substr(0, 5000).c_str());
     }
+    // The command as the library reads it, so that no path outside the scratch directory is used.
     const int command = arguments.size() > 1 ? atoi(arguments[1].c_str()) : 0;
     const size_t pathIndex = command == 2 ? 3 : command == 4 ? 4 : 0;
     std::string file;
     if (pathIndex != 0 && pathIndex < arguments.size()) {
-        file = scratchFileEndingIn(arguments[pathIndex]);
-        arguments[pathIndex] = file;
+        std::string name = "file.";
+        for (char byte : arguments[pathIndex].substr(0, 200)) name += byte == '/' ? '_' : byte;
+        arguments[pathIndex] = file = directory.file(name, time(nullptr) + 3600);
     }
     std::vector<char*> argv;
     for (std::string& argument : arguments) argv.push_back(argument.data());

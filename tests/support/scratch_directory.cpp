@@ -54,13 +54,4 @@ std::vector<unsigned char> expiryValue(int64_t expiry) {
     return value;
 }
 
-std::optional<int64_t> readExpiry(const std::string& path) {
-    std::vector<unsigned char> value = readAttribute(path);
-    if (value.empty()) return {};
-    EXPECT_EQ(value.size(), 16u) << path;
-    uint64_t bits = 0;
-    for (size_t i = 0; i < 8 && i < value.size(); ++i) bits |= uint64_t(value[i]) << (8 * i);
-    return static_cast<int64_t>(bits);
-}
-
 }  // namespace dlp::test

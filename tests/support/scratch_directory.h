@@ -29,7 +29,5 @@ class ScratchDirectory {
 std::vector<unsigned char> readAttribute(const std::string& path);
 void writeAttribute(const std::string& path, const std::vector<unsigned char>& value);
 std::vector<unsigned char> expiryValue(int64_t expiry);
-// The expiry a 16-byte value holds; nothing when the file carries no attribute.
-std::optional<int64_t> readExpiry(const std::string& path);
 
 }  // namespace dlp::test
