@@ -8,6 +8,7 @@ sandbox=$1 status=0
 inside=$("$sandbox" sh -c 'stat -f -c %T /data/system/users /dev; touch /data/system/users/mark')
 [[ $inside == $'tmpfs\ntmpfs' ]] || { echo "FAILED: inside the sandbox: $inside" >&2 && exit 1; }
 [[ ! -e /data/system/users/mark ]] || { echo "FAILED: a file made inside reached the machine" >&2 && exit 1; }
+# In a mount namespace of its own, so that a sandbox that obeyed could not touch the machine.
 status=0
-"$sandbox" --in-namespace "" / true 2>/dev/null || status=$?
+unshare --mount --propagation private "$sandbox" --in-namespace "" / true 2>/dev/null || status=$?
 ((status == 2)) || { echo "FAILED: the internal option ran, status $status" >&2 && exit 1; }
