@@ -1,6 +1,5 @@
 #include <dlp_sdk/expiry_attribute.h>
 #include <dlp_sdk/new_file_expiry.h>
-#include <dlp_sdk/process_name.h>
 
 #include <cerrno>
 #include <cstdint>
@@ -9,6 +8,7 @@
 #include "primitives/library_lock.h"
 #include "primitives/path_extension.h"
 #include "primitives/platform_log.h"
+#include "primitives/process_name.h"
 #include "processmap/entry_store.h"
 #include "processmap/process_classification.h"
 #include "processmap/process_map_internal.h"
@@ -99,7 +99,8 @@ int setExpiryforFile(int pid, char* path, int containerId) {
     }
     std::string extension = getExtensionFromPath(path);
     long callTime = getCurrentTimeInSec();
-    if (extension == "zip" && getProcessNameByPid(pid) == FILE_MANAGER_PACKAGE) {
+    char name[dlp::kProcessNameBufferSize];
+    if (extension == "zip" && dlp::readProcessName(pid, name) == FILE_MANAGER_PACKAGE) {
         return stampZipCopy(pid, path, callTime);
     }
 

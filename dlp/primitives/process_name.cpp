@@ -1,3 +1,5 @@
+#include "primitives/process_name.h"
+
 #include <dlp_sdk/process_name.h>
 
 #include <android-base/unique_fd.h>
@@ -10,8 +12,7 @@
 
 namespace {
 
-// One buffer for the path and then the name: a name keeps at most 254 bytes.
-constexpr size_t kProcessNameBufferSize = 255;
+using dlp::kProcessNameBufferSize;
 constexpr char kUnreadableName[] = "???";
 
 // "/proc/<pid>/cmdline", built by hand: this runs on every file a whitelisted app creates.
@@ -34,18 +35,24 @@ void formatCommandLinePath(int pid, char (&path)[kProcessNameBufferSize]) {
 
 }  // namespace
 
-std::string getProcessNameByPid(int pid) {
-    char buffer[kProcessNameBufferSize] = {};
+namespace dlp {
+
+std::string_view readProcessName(int pid, char (&buffer)[kProcessNameBufferSize]) {
     formatCommandLinePath(pid, buffer);
     android::base::unique_fd file(open(buffer, O_RDONLY | O_CLOEXEC));
-    ssize_t length = file.ok() ? read(file.get(), buffer, sizeof(buffer) - 1) : -1;
+    ssize_t length = file.ok() ? read(file.get(), buffer, kProcessNameBufferSize - 1) : -1;
     if (length < 0) {
         memcpy(buffer, kUnreadableName, sizeof(kUnreadableName));
     } else {
         buffer[length] = '\0';
     }
-    std::string name(buffer);
-    DLP_SYSTEM_DEBUG("DLP_LIBDLP : <getProcessNameByPid> pid[%d], processName[%s]", pid,
-                     name.c_str());
-    return name;
+    DLP_SYSTEM_DEBUG("DLP_LIBDLP : <getProcessNameByPid> pid[%d], processName[%s]", pid, buffer);
+    return buffer;
+}
+
+}  // namespace dlp
+
+std::string getProcessNameByPid(int pid) {
+    char buffer[kProcessNameBufferSize] = {};
+    return std::string(dlp::readProcessName(pid, buffer));
 }

@@ -1,8 +1,7 @@
 #include "processmap/entry_store.h"
 
-#include <dlp_sdk/process_name.h>
-
 #include "primitives/platform_log.h"
+#include "primitives/process_name.h"
 #include "processmap/extension_rules.h"
 #include "processmap/process_map_internal.h"
 
@@ -53,8 +52,9 @@ MapEntry HashMap::get(int key, std::string extension) {
     const std::vector<MapEntry>& entries = mMapIterator->second;
 
     // A zip that the file manager opened last is what it is unpacking or copying now.
+    char name[dlp::kProcessNameBufferSize];
     if (entries.back().value_extension == std::string_view("zip") &&
-        getProcessNameByPid(key) == FILE_MANAGER_PACKAGE) {
+        dlp::readProcessName(key, name) == FILE_MANAGER_PACKAGE) {
         MapEntry result = entries.back();
         result.value_extension = dlp::kUnpackedFromZipExtension;
         DLP_SYSTEM_DEBUG(

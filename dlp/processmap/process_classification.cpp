@@ -1,9 +1,9 @@
 #include "processmap/process_classification.h"
 
 #include <dlp_sdk/clock.h>
-#include <dlp_sdk/process_name.h>
 
 #include "primitives/platform_log.h"
+#include "primitives/process_name.h"
 #include "processmap/process_map_internal.h"
 
 namespace {
@@ -51,13 +51,14 @@ bool isRejectedProcess(HashMap& map, int pid, const MapEntry& entry) {
                 "DLP_LIBDLP : <HashMap::isRejectedPid> pid [%d] belongs to rejected process", pid);
         return true;
     }
-    std::string processName = getProcessNameByPid(pid);
+    char buffer[kProcessNameBufferSize];
+    std::string_view processName = readProcessName(pid, buffer);
     if (isWhitelisted(map, processName, entry)) return false;
     DLP_SYSTEM_DEBUG(
             "DLP_LIBDLP : <HashMap::isRejectedPid> pid [%d] does not belongs to whitelisted "
             "application process adding to reject list",
             pid);
-    map.mRejectList.emplace(pid, std::move(processName));
+    map.mRejectList.emplace(pid, processName);
     return true;
 }
 
