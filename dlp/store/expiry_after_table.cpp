@@ -169,7 +169,8 @@ int setTimeLocked(int id, int time) {
 
     WriteTransaction transaction(database.get());
     if (!transaction.begin(error)) {
-        DLP_PRIMITIVE_LOG("DLP_LIBEPM : set_time : SQL error: %s\n", error.get());
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : set_time : SQL error: %s\n",
+                          error ? error.get() : "out of memory");
         return 1;
     }
     LookUp found = LookUp::kNoRow;
