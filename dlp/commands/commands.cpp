@@ -57,7 +57,13 @@ bool hasNullArgument(int argc, char** argv) {
     return false;
 }
 
-// atoi's reading of `text` (leading blanks, a sign, the digits up to the first other byte, no
+std::nullopt_t refuseOutOfRange(char* const* argv, int index) {
+    DLP_SYSTEM_ERROR("DLP_LIBDLP : <handleDLPCommands> FATAL: argument [%d] is out of range: %s",
+                     index, argv[index]);
+    return std::nullopt;
+}
+
+// atoi's reading of the argument (leading blanks, a sign, the digits up to the first other byte, no
 // digits reads as 0), but refused, with its message, when the value lies outside int: wrapped,
 // it would name another pid or container.
 std::optional<int> parseNumber(char* const* argv, int index) {
@@ -72,12 +78,7 @@ std::optional<int> parseNumber(char* const* argv, int index) {
         magnitude = magnitude * 10 + static_cast<unsigned long long>(*cursor - '0');
         if (magnitude > kLargestMagnitude) break;
     }
-    if (magnitude > kLargestMagnitude - (negative ? 0 : 1)) {
-        DLP_SYSTEM_ERROR(
-                "DLP_LIBDLP : <handleDLPCommands> FATAL: argument [%d] is out of range: %s", index,
-                argv[index]);
-        return std::nullopt;
-    }
+    if (magnitude > kLargestMagnitude - (negative ? 0 : 1)) return refuseOutOfRange(argv, index);
     return negative ? static_cast<int>(0ull - magnitude) : static_cast<int>(magnitude);
 }
 
@@ -88,10 +89,8 @@ std::optional<long> parseExpiry(char* const* argv, int index) {
     long expiry = strtol(argv[index], nullptr, 0);
     bool outOfRange = errno == ERANGE;
     errno = savedErrno;
-    if (!outOfRange) return expiry;
-    DLP_SYSTEM_ERROR("DLP_LIBDLP : <handleDLPCommands> FATAL: argument [%d] is out of range: %s",
-                     index, argv[index]);
-    return std::nullopt;
+    if (outOfRange) return refuseOutOfRange(argv, index);
+    return expiry;
 }
 
 bool isPathTooLong(const char* path) {
