@@ -29,14 +29,14 @@ static_assert(DLP_LOCK_ENABLE == 0x40047801, "request number fixed by the driver
 static_assert(DLP_LOCK_DISABLE == 0x40047802, "request number fixed by the driver");
 static_assert(DLP_EXTENSION_SET == 0x43F07803, "request number fixed by the driver");
 
-int openDevice() {
-    int fd = open(kDevicePath, O_RDONLY | O_CLOEXEC);
-    if (fd < 0) DLP_PRIMITIVE_LOG("DLP_LIBDLP :  Can't open device file: %s\n", kDevicePath);
-    return fd;
+android::base::unique_fd openDevice() {
+    android::base::unique_fd device(open(kDevicePath, O_RDONLY | O_CLOEXEC));
+    if (!device.ok()) DLP_PRIMITIVE_LOG("DLP_LIBDLP :  Can't open device file: %s\n", kDevicePath);
+    return device;
 }
 
 int sendLockRequest(int id, unsigned long request, const char* requestName) {
-    android::base::unique_fd device(openDevice());
+    android::base::unique_fd device = openDevice();
     if (!device.ok()) return -1;
     int32_t argument = id;
     if (ioctl(device.get(), request, &argument) < 0) {
@@ -53,7 +53,7 @@ int set_dlp_extension(int id, const char* extensions) {
         DLP_PRIMITIVE_LOG("DLP_LIBDLP :  Extension list is null");
         return -1;
     }
-    android::base::unique_fd device(openDevice());
+    android::base::unique_fd device = openDevice();
     if (!device.ok()) return -1;
     size_t length = strlen(extensions);
     if (length > kLongestExtensionText) {

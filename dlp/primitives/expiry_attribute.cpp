@@ -1,5 +1,6 @@
 #include <dlp_sdk/expiry_attribute.h>
 
+#include <endian.h>
 #include <sys/xattr.h>
 
 #include <cerrno>
@@ -17,14 +18,14 @@ constexpr size_t kExpiryValueSize = 16;
 
 void encodeExpiry(long expiry, unsigned char (&value)[kExpiryValueSize]) {
     memset(value, 0, sizeof(value));
-    uint64_t bits = static_cast<uint64_t>(expiry);
-    for (size_t i = 0; i < 8; ++i) value[i] = static_cast<unsigned char>(bits >> (8 * i));
+    uint64_t bits = htole64(static_cast<uint64_t>(expiry));
+    memcpy(value, &bits, sizeof(bits));
 }
 
 long decodeExpiry(const unsigned char (&value)[kExpiryValueSize]) {
-    uint64_t bits = 0;
-    for (size_t i = 0; i < 8; ++i) bits |= static_cast<uint64_t>(value[i]) << (8 * i);
-    return static_cast<long>(bits);
+    uint64_t bits;
+    memcpy(&bits, value, sizeof(bits));
+    return static_cast<long>(le64toh(bits));
 }
 
 }  // namespace

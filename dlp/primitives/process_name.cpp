@@ -6,6 +6,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <charconv>
 #include <cstring>
 
 #include "primitives/platform_log.h"
@@ -15,22 +17,12 @@ namespace {
 using dlp::kProcessNameBufferSize;
 constexpr char kUnreadableName[] = "???";
 
-// "/proc/<pid>/cmdline", built by hand: this runs on every file a whitelisted app creates.
+// "/proc/<pid>/cmdline" without snprintf: this runs on every file a whitelisted app creates.
 void formatCommandLinePath(int pid, char (&path)[kProcessNameBufferSize]) {
-    char digits[16];
-    size_t count = 0;
-    // Unsigned, so that the most negative pid has a magnitude as well.
-    unsigned int magnitude = pid < 0 ? 0u - static_cast<unsigned int>(pid) : pid;
-    do {
-        digits[count++] = static_cast<char>('0' + magnitude % 10);
-        magnitude /= 10;
-    } while (magnitude != 0);
-    char* cursor = path;
-    memcpy(cursor, "/proc/", 6);
-    cursor += 6;
-    if (pid < 0) *cursor++ = '-';
-    while (count > 0) *cursor++ = digits[--count];
-    memcpy(cursor, "/cmdline", sizeof("/cmdline"));
+    constexpr std::string_view kPrefix = "/proc/", kSuffix = "/cmdline";
+    char* digitsEnd = std::to_chars(path + kPrefix.size(), path + sizeof(path), pid).ptr;
+    kPrefix.copy(path, kPrefix.size());
+    *std::copy(kSuffix.begin(), kSuffix.end(), digitsEnd) = '\0';
 }
 
 }  // namespace

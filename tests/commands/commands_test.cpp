@@ -43,6 +43,7 @@ TEST(handleDLPCommands, RefusesMalformedVectorsAndChangesNothing) {
             {{"3", "4294967446", "60"}, {"argument [2] is out of range: 4294967446"}},
             {{"6", "150", " 4294967297"}, {"argument [3] is out of range:  4294967297"}},
             {{"4", "0", "-2147483649", "f.pdf"}, {"argument [3] is out of range: -2147483649"}},
+            {{"1", "2147483648"}, {"argument [2] is out of range: 2147483648"}},
             {{"2", "150", "f.pdf", "9223372036854775808"},
              {"argument [4] is out of range: 9223372036854775808"}},
     };
@@ -74,19 +75,43 @@ TEST(handleDLPCommands, ReadsNumbersAsAtoiDoes) {
     runCommand({"6", "150", "0"});
 }
 
-// What each command changes; the scenarios under tests/decisions show the rest through files.
-TEST(handleDLPCommands, RunsEachCommand) {
+// Each command's own messages, its callees' left out; what the commands do to files shows in
+// commands.trace.
+TEST(handleDLPCommands, LogsEachCommandsOutcome) {
     SKIP_UNLESS_DATABASE_IS_THROWAWAY();
     FreshProcessMap map;
     ScratchDirectory directory;
-    EXPECT_EQ(runCommand({"4", "0", "4242", directory.file("b.pdf", 4102444800)}), 0);
-    EXPECT_EQ(runCommand({"1", "4242"}), 0);
-    EXPECT_EQ(runCommand({"5", "0", "def"}), 0);
-    EXPECT_EQ(runCommand({"5", "0", "pdf,abc,abc,"}), 0);
-    EXPECT_EQ(runCommand({"6", "140", "2"}), 0);
+    LogCapture log;
+    std::vector<int> results;
+    for (const std::vector<std::string>& words :
+         {std::vector<std::string>{"2", "150", directory.file("a.pdf"), "5"},
+          {"2", "150", directory.file("a.xyz"), "5"},
+          {"2", "150", directory.path() + "/missing.pdf", "5"},
+          {"3", "150", "60"},
+          {"3", "99", "60"},
+          {"4", "0", "4242", directory.file("b.pdf", 4102444800)},
+          {"5", "0", "pdf,abc,abc,"},
+          {"6", "140", "2"},
+          {"1", "4242"}}) {
+        results.push_back(runCommand(words));
+    }
     // A failed store is the dispatcher's -1, as every failure of its own.
-    EXPECT_EQ(runCommand({"3", "99", "60"}), -1);
-    EXPECT_EQ(runCommand({"2", "150", directory.path() + "/missing.pdf", "5"}), -1);
+    EXPECT_EQ(results, (std::vector<int>{0, 0, -1, 0, -1, 0, 0, 0, 0}));
+    std::vector<LogRecord> own;
+    for (LogRecord& record : log.take()) {
+        if (record.text.find("<handleDLPCommands>") != std::string::npos) own.push_back(record);
+    }
+    auto debug = [](const std::string& text) { return systemDebug(kOwn + text); };
+    auto error = [](const std::string& text) { return systemError(kOwn + text); };
+    EXPECT_EQ(own, (std::vector<LogRecord>{
+                           debug("setxattr OK\n"),
+                           error("extension passed is not valid. setting IT Admin set Expiry"),
+                           debug("setxattr OK\n"), error("Error: setxattr failed with error -1\n"),
+                           debug("set_expiryAfter_time OK\n"),
+                           error("Error: set_expiryAfter_time failed with error 1\n"),
+                           debug("addOrUpdateMapEntry OK\n"),
+                           debug("Extension recieved : pdf,abc,abc,\n"),
+                           debug("setDLPExpiryAfter command [ContainerId = 140, logState = 2]")}));
     EXPECT_TRUE(HashMap::mInternalProcessMap.empty());
     EXPECT_EQ(mProcessMap.mExtensionList, (std::vector<std::string>{"abc", ""}));
     EXPECT_EQ(getDLPAuditLogState(), 2);
