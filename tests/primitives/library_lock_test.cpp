@@ -2,7 +2,6 @@
 #include <dlp_sdk/expiry_after_table.h>
 #include <dlp_sdk/new_file_expiry.h>
 #include <dlp_sdk/pending_inode.h>
-#include <dlp_sdk/process_map.h>
 #include <gtest/gtest.h>
 
 #include <atomic>
@@ -11,7 +10,6 @@
 
 #include "support/command_vector.h"
 #include "support/duration_database.h"
-#include "support/process_map_reset.h"
 #include "support/scratch_directory.h"
 
 namespace dlp::test {
@@ -47,37 +45,6 @@ TEST(LibraryLock, CallsRacingTheExitWait) {
     int abnormal = 0;
     for (int count = 0; count < 200; ++count) abnormal += system(run.c_str()) != 0;
     EXPECT_EQ(abnormal, 0) << "of 200 runs did not end with exit(0)";
-}
-
-// Four threads record openings, create files, park inodes and replace the extension list at
-// once, each pid its own: nothing is lost. ThreadSanitizer watches the rest.
-TEST(LibraryLock, ConcurrentCallersLoseNothing) {
-    SKIP_UNLESS_DATABASE_IS_THROWAWAY();
-    FreshProcessMap freshMap;
-    ScratchDirectory directory;
-    __android_log_set_minimum_priority(ANDROID_LOG_SILENT);
-    std::vector<std::thread> threads;
-    for (int pid = 900000; pid < 900004; ++pid) {
-        threads.emplace_back([&directory, pid] {
-            std::string opened = directory.file(std::to_string(pid) + ".pdf", pid + 2000000000L);
-            std::string created = directory.file(std::to_string(pid) + "-new.pdf");
-            for (unsigned long round = 0; round < 200; ++round) {
-                EXPECT_EQ(runCommand({"4", "0", std::to_string(pid), opened}) +
-                                  runCommand({"5", "0", "abc"}) + runCommand({"6", "100", "1"}) +
-                                  setExpiryforFile(pid, created.data(), 150),
-                          0);
-                EXPECT_TRUE(putPendingInodeValue(pid * 1000UL + round, pid));
-                EXPECT_EQ(getPidByInode(pid * 1000UL + round), pid);
-            }
-        });
-    }
-    for (std::thread& thread : threads) thread.join();
-    __android_log_set_minimum_priority(ANDROID_LOG_DEFAULT);
-    for (int pid = 900000; pid < 900004; ++pid) {
-        ASSERT_EQ(HashMap::mInternalProcessMap[pid].size(), 1u) << pid;
-        EXPECT_EQ(HashMap::mInternalProcessMap[pid][0].value_expiry, pid + 2000000000L) << pid;
-    }
-    EXPECT_EQ(HashMap::mPendingInodeMap.size(), 800u);
 }
 
 }  // namespace dlp::test

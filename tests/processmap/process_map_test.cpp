@@ -34,11 +34,11 @@ TEST(HashMap, EveryLoadStartsFromTheSameState) {
         auto& entries = symbol<ProcessEntries>(library, "_ZN7HashMap19mInternalProcessMapE");
         auto& inodes =
                 symbol<std::map<unsigned long, int>>(library, "_ZN7HashMap16mPendingInodeMapE");
-        EXPECT_EQ(map.mDefaultExtensions,
-                  (std::vector<std::string>{"xls", "xlsx",     "doc", "docx", "ppt", "pptx", "pdf",
-                                            "jpg", "jpeg",     "mp4", "zip",  "txt", "asd",  "xlam",
-                                            "htm", "html",     "mht", "eml",  "msg", "hwp",  "gul",
-                                            "rtf", "ostrilex", "png", "gif"}));
+        std::string defaults;
+        for (const std::string& extension : map.mDefaultExtensions) defaults += extension + " ";
+        EXPECT_EQ(defaults,
+                  "xls xlsx doc docx ppt pptx pdf jpg jpeg mp4 zip txt asd xlam htm html "
+                  "mht eml msg hwp gul rtf ostrilex png gif ");
         EXPECT_EQ(map.mExtensionGroups.size(), 15u);
         EXPECT_TRUE(map.mExtensionList.empty() && map.mRejectList.empty());
         EXPECT_TRUE(entries.empty() && inodes.empty());

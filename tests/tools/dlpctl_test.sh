@@ -39,7 +39,6 @@ while IFS='|' read -r status arguments stdin stderr; do
 done <<'CASES'
 2|replay -|create 7 a.doc x|dlpctl: -:1: bad number 'x'
 2|replay -|show "a.doc|dlpctl: -:1: unterminated quote
-2|replay -|frob a|dlpctl: -:1: unknown line kind 'frob'
 2|||usage: dlpctl*
 2|--bogus show none||dlpctl: unknown option --bogus*
 2|stamp report +1y||dlpctl: stamp: bad expiry '+1y'*

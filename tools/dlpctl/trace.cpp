@@ -153,7 +153,10 @@ class TracePlayer {
                 words[pidIndex] = std::to_string(processes_.realPid(*tracePid));
             }
         }
-        return std::to_string(runCommandVector(std::move(words)));
+        // Command 2 stamps a file: what it got shows beside the result, as for a created file.
+        std::string stamped = command == 2 && words.size() == 4 ? words[2] : "";
+        std::string result = std::to_string(runCommandVector(std::move(words)));
+        return stamped.empty() ? result : result + " " + showResult(stamped);
     }
 
     // The process created PATH, so a replay away from the device makes it where it is missing.

@@ -1,5 +1,6 @@
-// The path rule and the entry rules, one step per line: an operation byte (put, add an
-// extension, remove, get), a pid byte, an expiry byte, then a path whose extension the step uses.
+// The process map's rules, one step per line: an operation byte (put, replace the administrator's
+// list, remove, get), a pid byte, an expiry byte, then a path whose extension the step uses (a
+// list, for the administrator's, that must split into tokens which join into it again).
 #include <android/log.h>
 #include <dlp_sdk/process_map.h>
 
@@ -8,6 +9,7 @@
 #include <set>
 #include <sstream>
 #include <string>
+#include <vector>
 
 #include "primitives/library_lock.h"
 #include "primitives/path_extension.h"
@@ -34,7 +36,13 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         if (extension != expected) abort();
         const unsigned char operation = static_cast<unsigned char>(line[0]) % 4;
         if (operation == 0) mProcessMap.put(pid, MapEntry{pid, extension, expiry, 1});
-        if (operation == 1) mProcessMap.addExtension(extension);
+        if (operation == 1) {
+            const std::vector<std::string> tokens = getExtensions(path.c_str(), ',');
+            std::string joined;
+            for (size_t i = 0; i < tokens.size(); ++i) joined += (i == 0 ? "" : ",") + tokens[i];
+            if (joined != path) abort();
+            for (const std::string& token : tokens) mProcessMap.addExtension(token);
+        }
         if (operation == 2) mProcessMap.remove(pid);
         // A look-up gives the pid's own entry or the empty one.
         const int found = operation == 3 ? mProcessMap.get(pid, extension).value_pid : pid;
