@@ -64,10 +64,10 @@ TEST(handleDLPCommands, RefusesMalformedVectorsAndChangesNothing) {
 
 TEST(handleDLPCommands, ReadsNumbersAsAtoiDoes) {
     const std::pair<const char*, int> cases[] = {{"-2147483648", -2147483647 - 1},
-                                                 {" \t+12abc", 12},
+                                                 {" \t-12abc", -12},
                                                  {"x", 0},
                                                  {"2147483647", 2147483647},
-                                                 {"00000000000000000007", 7}};
+                                                 {"+00000000000000000007", 7}};
     for (const auto& [text, state] : cases) {
         EXPECT_EQ(runCommand({"6", "150", text}), 0) << text;
         EXPECT_EQ(getDLPAuditLogState(), state) << text;
