@@ -145,6 +145,13 @@ TEST(init_table, TakesAnExistingFileWithoutTheTableAsReady) {
                    store("get_time : No id in the list\n"),
                    store("set_time : id : 104, It is not in the table. add time as 5\n")}));
     EXPECT_EQ(DurationDatabase().rows(), (Rows{{104, 5}}));
+    // A write the database refuses is a failure, its new value still cached.
+    ASSERT_EQ(DurationDatabase().execute("CREATE TRIGGER refuse BEFORE INSERT ON dlpInfo BEGIN "
+                                         "SELECT RAISE(ABORT, 'refused'); END"),
+              SQLITE_OK);
+    EXPECT_EQ((Results{set_time(106, 7), get_time(106)}), (Results{1, 7}));
+    EXPECT_EQ(log.take().back(), store("set_time : SQL error: refused\n"));
+    EXPECT_EQ(DurationDatabase().execute("DROP TRIGGER refuse"), SQLITE_OK);
 }
 
 // The database out of reach: a cached duration is still served, a write still reaches the
