@@ -34,6 +34,12 @@ class NativeMethodsTest {
         assertEquals("1", deviceState("lock.12"));
         assertTrue(DLPManagerService.Native_Dlp_UnlockDLP(12));
         assertEquals("0", deviceState("lock.12"));
+        // A device that refuses every request: each bridge says false.
+        Files.writeString(Path.of(System.getenv("DLP_DEVICE_STATE"), "fail"),
+                "0x40047801 1\n0x40047802 1\n0x43f07803 1\n");
+        assertFalse(DLPManagerService.Native_Dlp_LockDLP(12));
+        assertFalse(DLPManagerService.Native_Dlp_UnlockDLP(12));
+        assertFalse(DLPManagerService.Native_Dlp_SetDLPExtension(11, "doc"));
     }
 
     /** What the device stand-in keeps of the requests it received. */
