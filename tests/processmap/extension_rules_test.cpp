@@ -35,14 +35,7 @@ TEST(HashMap_isValidExtension, AcceptsTheBuiltInsAndTheAdministratorsExtensions)
     EXPECT_EQ(mProcessMap.isValidExtension("abc"), 1);
 }
 
-TEST(HashMap_addExtension, AddsWhatNeitherListHolds) {
-    FreshProcessMap fresh;
-    LibraryLockGuard guard;
-    for (const char* extension : {"pdf", "abc", "abc", ""})
-        EXPECT_EQ(mProcessMap.addExtension(extension), 1);
-    EXPECT_EQ(mProcessMap.mExtensionList, (Tokens{"abc", ""}));
-    EXPECT_EQ(mProcessMap.isValidExtension(""), 1);
-}
+// addExtension's duplicates, built-ins and empty tokens show through command 5's test.
 
 TEST(HashMap_getValidMapEntryIndexForExt, FindsTheMostRecentRelatedEntry) {
     // (extension, the extensions of the entries, oldest first, expected index)
