@@ -172,8 +172,7 @@ TEST(init_table, ReportsADirectoryThatCannotBeCreated) {
                                mainError("DLP_LOG : set id : 105, time : 60 is fail\n")}));
     // Room for the file but not for its table.
     ASSERT_EQ(mount("dlp-full", "/data/system/users", "tmpfs", 0, "size=4k"), 0);
-    EXPECT_EQ(init_table(), 1);
-    EXPECT_EQ(umount2("/data/system/users", 0), 0);
+    EXPECT_EQ((Results{init_table(), umount2("/data/system/users", 0)}), (Results{1, 0}));
     EXPECT_EQ(log.take(), Log{store("init_table : SQL error: database or disk is full\n")});
 }
 
