@@ -31,7 +31,7 @@ TEST(HashMap_isValidExtension, AcceptsTheBuiltInsAndTheAdministratorsExtensions)
     for (const char* other : {"PDF", "tmp", "", "xostrilex", "abc"})
         EXPECT_EQ(mProcessMap.isValidExtension(other), 0) << other;
     EXPECT_EQ(mProcessMap.isValidExtension(std::string("\0pdf", 4)), 0);
-    mProcessMap.addExtension("abc");
+    EXPECT_EQ(mProcessMap.addExtension("abc"), 1);
     EXPECT_EQ(mProcessMap.isValidExtension("abc"), 1);
 }
 
