@@ -45,6 +45,6 @@ std::string_view readProcessName(int pid, char (&buffer)[kProcessNameBufferSize]
 }  // namespace dlp
 
 std::string getProcessNameByPid(int pid) {
-    char buffer[kProcessNameBufferSize] = {};
+    char buffer[kProcessNameBufferSize];
     return std::string(dlp::readProcessName(pid, buffer));
 }

@@ -167,12 +167,14 @@ int setTimeLocked(int id, int time) {
     SqliteText error;
     execute(database.get(), kCreateTable, error);
 
-    WriteTransaction transaction(database.get());
-    if (!transaction.begin(error)) {
+    // sqlite gives no text when it ran out of memory writing one.
+    auto failed = [&error] {
         DLP_PRIMITIVE_LOG("DLP_LIBEPM : set_time : SQL error: %s\n",
                           error ? error.get() : "out of memory");
         return 1;
-    }
+    };
+    WriteTransaction transaction(database.get());
+    if (!transaction.begin(error)) return failed();
     LookUp found = LookUp::kNoRow;
     if (Statement select = selectDuration(database.get(), id, "set_time :")) {
         found = step(database.get(), select.get(), error);
@@ -189,9 +191,7 @@ int setTimeLocked(int id, int time) {
     // A failed look-up must not pass for a missing row: that would add a second row for the id.
     if (found == LookUp::kFailed || !sql || !execute(database.get(), sql.get(), error) ||
         !transaction.commit(error)) {
-        DLP_PRIMITIVE_LOG("DLP_LIBEPM : set_time : SQL error: %s\n",
-                          error ? error.get() : "out of memory");
-        return 1;
+        return failed();
     }
     return 0;
 }
