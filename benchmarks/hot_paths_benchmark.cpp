@@ -1,6 +1,5 @@
 // The library runs on every file open and create of a phone. Each case here runs beside its
 // floor, the system calls that the same work cannot do without, under three log configurations.
-#include <dlp_sdk/commands.h>
 #include <dlp_sdk/expiry_after_table.h>
 #include <dlp_sdk/file_open_tracking.h>
 #include <dlp_sdk/new_file_expiry.h>
@@ -9,36 +8,34 @@
 #include <android-base/unique_fd.h>
 #include <benchmark/benchmark.h>
 #include <fcntl.h>
-#include <linux/magic.h>
-#include <stdlib.h>
-#include <sys/statfs.h>
 #include <sys/xattr.h>
 #include <unistd.h>
 
-#include <array>
-#include <cerrno>
 #include <cstdint>
 #include <cstdio>
 #include <cstring>
-#include <filesystem>
+#include <exception>
 #include <functional>
-#include <stdexcept>
 #include <string>
 #include <vector>
 
+#include "command_vector.h"
 #include "log_configuration.h"
+#include "named_process.h"
 #include "primitives/library_lock.h"
 #include "process_map_population.h"
-#include "support/child_process.h"
+#include "support/duration_database.h"
+#include "support/scratch_directory.h"
 
 namespace {
 
 using dlp::benchmarks::applyLogConfiguration;
 using dlp::benchmarks::LogConfiguration;
+using dlp::test::expiryValue;
+using dlp::test::kDatabasePath;
 
 constexpr const char* kExpiryAttribute = "user.zorvat_dlp";
 constexpr size_t kExpiryValueSize = 16;
-constexpr const char* kDatabasePath = "/data/system/users/dlp/dlpinfo.db";
 constexpr int kContainerId = 120;
 constexpr int kDurationSeconds = 86400;
 constexpr long kWeekSeconds = 7 * 86400;
@@ -47,62 +44,19 @@ constexpr int kProcessCounts[] = {10, 10000, 100000};
 // ahead, so every timed call of one run writes.
 constexpr long kZipCopyWindowSeconds = 20;
 
-using ExpiryValue = std::array<unsigned char, kExpiryValueSize>;
-
-ExpiryValue expiryValue(long expiry) {
-    ExpiryValue value{};
-    for (size_t i = 0; i < 8; ++i) {
-        value[i] = static_cast<unsigned char>(static_cast<uint64_t>(expiry) >> (8 * i));
-    }
-    return value;
-}
-
-void writeExpiry(const std::string& path, long expiry) {
-    ExpiryValue value = expiryValue(expiry);
-    if (setxattr(path.c_str(), kExpiryAttribute, value.data(), value.size(), 0) != 0) {
-        throw std::runtime_error("setxattr " + path + ": " + strerror(errno));
-    }
-}
+using ExpiryValue = std::vector<unsigned char>;
 
 // The expiry on the file, -1 when it has none.
 long storedExpiry(const std::string& path) {
-    ExpiryValue value{};
-    if (getxattr(path.c_str(), kExpiryAttribute, value.data(), value.size()) !=
-        static_cast<ssize_t>(kExpiryValueSize)) {
-        return -1;
-    }
+    ExpiryValue value = dlp::test::readAttribute(path);
+    if (value.size() != kExpiryValueSize) return -1;
     uint64_t bits = 0;
     for (size_t i = 0; i < 8; ++i) bits |= static_cast<uint64_t>(value[i]) << (8 * i);
     return static_cast<long>(bits);
 }
 
-// The library's fixed store path must be the sandbox's throwaway tmpfs, never a device's data.
-bool databaseDirectoryIsThrowaway() {
-    struct statfs fileSystem {};
-    return statfs("/data/system/users", &fileSystem) == 0 && fileSystem.f_type == TMPFS_MAGIC;
-}
-
-// A command vector as callers send it, built once so that a timed call only dispatches.
-class CommandVector {
-  public:
-    explicit CommandVector(std::vector<std::string> words) : words_(std::move(words)) {
-        words_.insert(words_.begin(), "dlp");
-        for (std::string& word : words_) argv_.push_back(word.data());
-        argv_.push_back(nullptr);
-    }
-    int run() { return handleDLPCommands(static_cast<int>(words_.size()), argv_.data()); }
-
-  private:
-    std::vector<std::string> words_;
-    std::vector<char*> argv_;
-};
-
-int runCommand(std::vector<std::string> words) {
-    return CommandVector(std::move(words)).run();
-}
-
 void forgetProcess(pid_t pid) {
-    runCommand({"1", std::to_string(pid)});
+    runCommandVector({"1", std::to_string(pid)});
 }
 
 // Whether the pid's most recent entry is the file just reported.
@@ -142,57 +96,23 @@ class DatabaseAside {
     bool moved_;
 };
 
-class ScratchDirectory {
-  public:
-    ScratchDirectory() {
-        // No "." in the directory: the library takes the extension from the whole path.
-        std::string pattern = std::filesystem::temp_directory_path() / "dlp-benchmark-XXXXXX";
-        if (mkdtemp(pattern.data()) == nullptr) {
-            throw std::runtime_error(std::string("mkdtemp: ") + strerror(errno));
-        }
-        path_ = pattern;
-    }
-    ~ScratchDirectory() {
-        std::error_code ignored;
-        std::filesystem::remove_all(path_, ignored);
-    }
-    ScratchDirectory(const ScratchDirectory&) = delete;
-    ScratchDirectory& operator=(const ScratchDirectory&) = delete;
-
-    std::string file(const std::string& name) const {
-        std::string path = path_ + "/" + name;
-        android::base::unique_fd file(
-                open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644));
-        if (!file.ok()) throw std::runtime_error("open " + path + ": " + strerror(errno));
-        return path;
-    }
-    std::string stampedFile(const std::string& name, long expiry) const {
-        std::string path = file(name);
-        writeExpiry(path, expiry);
-        return path;
-    }
-
-  private:
-    std::string path_;
-};
-
 // The files and app processes that the cases act on, built once for the whole run.
 struct Scene {
     long start = getCurrentTimeInSec();
-    ScratchDirectory directory;
-    dlp::test::ChildProcess office{"com.hancom.office.viewer"};
-    dlp::test::ChildProcess notes{"org.example.notes"};
-    dlp::test::ChildProcess fileManager{"com.vux.android.app.filbrook"};
+    dlp::test::ScratchDirectory directory;
+    NamedProcess office{"com.hancom.office.viewer"};
+    NamedProcess notes{"org.example.notes"};
+    NamedProcess fileManager{"com.vux.android.app.filbrook"};
 
     long protectedExpiry = start + kWeekSeconds;
-    std::string protectedFile = directory.stampedFile("protected.docx", protectedExpiry);
+    std::string protectedFile = directory.file("protected.docx", protectedExpiry);
     std::string plainFile = directory.file("plain.docx");
 
     long officeOpenedExpiry = start + kWeekSeconds + 1;
-    std::string officeOpened = directory.stampedFile("report.docx", officeOpenedExpiry);
+    std::string officeOpened = directory.file("report.docx", officeOpenedExpiry);
     std::string officeCreated = directory.file("report-copy.doc");
 
-    std::string notesOpened = directory.stampedFile("notes.docx", start + kWeekSeconds + 2);
+    std::string notesOpened = directory.file("notes.docx", start + kWeekSeconds + 2);
     std::string notesCreated = directory.file("notes-copy.doc");
 
     std::string archiveOpened = directory.file("bundle.zip");
@@ -237,7 +157,7 @@ void fileOpen(benchmark::State& state, LogConfiguration configuration, bool isPr
 
 void fileOpenFloor(benchmark::State& state, bool isProtected) {
     const char* path = (isProtected ? scene->protectedFile : scene->plainFile).c_str();
-    ExpiryValue value{};
+    ExpiryValue value(kExpiryValueSize);
     ssize_t expected = isProtected ? static_cast<ssize_t>(kExpiryValueSize) : -1;
     if (getxattr(path, kExpiryAttribute, value.data(), value.size()) != expected) {
         return state.SkipWithError("getxattr did not answer as the case's file should");
@@ -255,7 +175,7 @@ void inheritingCreate(benchmark::State& state, LogConfiguration configuration) {
     pid_t pid = scene->office.pid();
     std::string created = scene->officeCreated;
     forgetProcess(pid);
-    runCommand({"4", "0", std::to_string(pid), scene->officeOpened});
+    runCommandVector({"4", "0", std::to_string(pid), scene->officeOpened});
     if (!storedLast(pid, "docx", scene->officeOpenedExpiry)) {
         return state.SkipWithError("the office app's docx was not recorded");
     }
@@ -293,7 +213,7 @@ void rejectedCreate(benchmark::State& state, LogConfiguration configuration) {
     pid_t pid = scene->notes.pid();
     std::string created = scene->notesCreated;
     forgetProcess(pid);
-    runCommand({"4", "0", std::to_string(pid), scene->notesOpened});
+    runCommandVector({"4", "0", std::to_string(pid), scene->notesOpened});
     setExpiryforFile(pid, created.data(), kContainerId);
     if (!isRejected(pid)) return state.SkipWithError("the app was not put on the reject list");
     {
@@ -333,9 +253,9 @@ void zipCopy(benchmark::State& state, LogConfiguration configuration) {
     pid_t pid = scene->fileManager.pid();
     std::string created = scene->archiveCreated;
     long openedExpiry = getCurrentTimeInSec() + kZipCopyWindowSeconds;
-    writeExpiry(scene->archiveOpened, openedExpiry);
+    dlp::test::writeAttribute(scene->archiveOpened, expiryValue(openedExpiry));
     forgetProcess(pid);
-    runCommand({"4", "0", std::to_string(pid), scene->archiveOpened});
+    runCommandVector({"4", "0", std::to_string(pid), scene->archiveOpened});
     if (!storedLast(pid, "zip", openedExpiry)) {
         return state.SkipWithError("the file manager's zip was not recorded");
     }
@@ -356,7 +276,7 @@ void zipCopyFloor(benchmark::State& state) {
     std::string commandLine = processCommandLinePath(scene->fileManager.pid());
     const char* created = scene->archiveCreated.c_str();
     ExpiryValue value = expiryValue(getCurrentTimeInSec() + kZipCopyWindowSeconds);
-    ExpiryValue current{};
+    ExpiryValue current(kExpiryValueSize);
     char name[255];
     if (!commandLineNames(commandLine, "com.vux.android.app.filbrook") ||
         setxattr(created, kExpiryAttribute, value.data(), value.size(), 0) != 0 ||
@@ -478,15 +398,15 @@ int main(int argc, char** argv) {
     dlp::benchmarks::rememberStartingLogSettings();
     benchmark::Initialize(&argc, argv);
     if (benchmark::ReportUnrecognizedArguments(argc, argv)) return 2;
-    if (!databaseDirectoryIsThrowaway()) {
+    if (!dlp::test::databaseIsThrowaway()) {
         printf("/data/system/users is not a throwaway tmpfs: run inside tools/dlp-sandbox\n");
         return 77;
     }
     try {
         Scene built;
         scene = &built;
-        if (runCommand({"3", std::to_string(kContainerId), std::to_string(kDurationSeconds)}) !=
-            0) {
+        if (runCommandVector(
+                    {"3", std::to_string(kContainerId), std::to_string(kDurationSeconds)}) != 0) {
             printf("command 3 could not store the container's duration\n");
             return 1;
         }

@@ -27,12 +27,14 @@ else
     timing=(--benchmark_min_time=0.05 --benchmark_repetitions=9
         --benchmark_enable_random_interleaving=true --benchmark_display_aggregates_only=true)
 fi
-results=$build/hot_paths_benchmark.json
-console=$build/hot_paths_benchmark.txt
+# It runs in the build tree, where its scratch files keep user attributes.
+build_path=$(cd "$build" && pwd)
+results=$build_path/hot_paths_benchmark.json
+console=$build_path/hot_paths_benchmark.txt
 echo "benchmark: running (console output in $console)"
 status=0
 # The default log configuration writes every message that passes to stderr.
-tools/dlp-sandbox bash -c 'exec "$@" 2>/dev/null' benchmark "$build/hot_paths_benchmark" \
+tools/dlp-sandbox bash -c 'cd "$0" && exec "$@" 2>/dev/null' "$build_path" "$build_path/hot_paths_benchmark" \
     "${timing[@]}" --benchmark_out="$results" --benchmark_out_format=json "$@" >"$console" ||
     status=$?
 if ((status != 0)); then

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "support/command_vector.h"
+#include "command_vector.h"
 #include "support/duration_database.h"
 #include "support/log_capture.h"
 #include "support/process_map_reset.h"
@@ -48,7 +48,7 @@ TEST(handleDLPCommands, RefusesMalformedVectorsAndChangesNothing) {
              {"argument [4] is out of range: 9223372036854775808"}},
     };
     for (const auto& [words, messages] : cases) {
-        EXPECT_EQ(runCommand(words), -1) << ::testing::PrintToString(words);
+        EXPECT_EQ(runCommandVector(words), -1) << ::testing::PrintToString(words);
         EXPECT_EQ(log.take(), errors(messages)) << ::testing::PrintToString(words);
     }
     char six[] = "6";
@@ -69,7 +69,7 @@ TEST(handleDLPCommands, ReadsNumbersAsAtoiDoes) {
                                                  {"2147483647", 2147483647},
                                                  {"+00000000000000000007", 7}};
     for (const auto& [text, state] : cases) {
-        EXPECT_EQ(runCommand({"6", "150", text}), 0) << text;
+        EXPECT_EQ(runCommandVector({"6", "150", text}), 0) << text;
         EXPECT_EQ(getDLPAuditLogState(), state) << text;
     }
 }
@@ -92,7 +92,7 @@ TEST(handleDLPCommands, LogsEachCommandsOutcome) {
           {"5", "0", "pdf,abc,abc,"},
           {"6", "140", "2"},
           {"1", "4242"}}) {
-        results.push_back(runCommand(words));
+        results.push_back(runCommandVector(words));
     }
     // A failed store is the dispatcher's -1, as every failure of its own.
     EXPECT_EQ(results, (std::vector<int>{0, 0, -1, 0, -1, 0, 0, 0, 0}));
@@ -121,12 +121,12 @@ TEST(handleDLPCommands, RefusesTextsThatWouldBeCut) {
     FreshProcessMap map;
     const std::string longest = "/" + std::string(4094, 'p'), list = std::string(999, 'a');
     LogCapture log;
-    EXPECT_EQ(runCommand({"2", "150", longest, "7"}), -1);  // as far as the attribute
-    EXPECT_EQ(runCommand({"4", "0", "4242", longest}), 0);  // a file without an expiry
-    EXPECT_EQ(runCommand({"5", "0", list}), 0);
-    EXPECT_EQ(runCommand({"2", "150", longest + "x", "7"}), -1);
-    EXPECT_EQ(runCommand({"4", "0", "4242", longest + "x"}), -1);
-    EXPECT_EQ(runCommand({"5", "0", list + "b"}), -1);
+    EXPECT_EQ(runCommandVector({"2", "150", longest, "7"}), -1);  // as far as the attribute
+    EXPECT_EQ(runCommandVector({"4", "0", "4242", longest}), 0);  // a file without an expiry
+    EXPECT_EQ(runCommandVector({"5", "0", list}), 0);
+    EXPECT_EQ(runCommandVector({"2", "150", longest + "x", "7"}), -1);
+    EXPECT_EQ(runCommandVector({"4", "0", "4242", longest + "x"}), -1);
+    EXPECT_EQ(runCommandVector({"5", "0", list + "b"}), -1);
     std::vector<LogRecord> refusals;
     for (LogRecord& record : log.take()) {
         if (record.text.find("FATAL") != std::string::npos) refusals.push_back(record);

@@ -8,8 +8,8 @@
 #include <tuple>
 #include <vector>
 
-#include "support/child_process.h"
-#include "support/command_vector.h"
+#include "command_vector.h"
+#include "named_process.h"
 #include "support/log_capture.h"
 #include "support/process_map_reset.h"
 #include "support/scratch_directory.h"
@@ -31,10 +31,10 @@ TEST(setExpiryforFile, RefusesNullPath) {
 TEST(setExpiryforFile, ReturnsErrnoOfRefusedWriteExceptForZipCopy) {
     FreshProcessMap map;
     ScratchDirectory directory;
-    ChildProcess office("com.hancom.office.viewer"), notes("com.example.notes"),
+    NamedProcess office("com.hancom.office.viewer"), notes("com.example.notes"),
             fileManager("com.vux.android.app.filbrook");
-    ASSERT_EQ(runCommand({"4", "0", std::to_string(office.pid()),
-                          directory.file("opened.doc", 4102444800)}),
+    ASSERT_EQ(runCommandVector({"4", "0", std::to_string(office.pid()),
+                                directory.file("opened.doc", 4102444800)}),
               0);
     for (const auto& [pid, name, result] : {std::tuple(office.pid(), "inherited.doc", EPERM),
                                             std::tuple(notes.pid(), "new.pdf", EPERM),
@@ -51,7 +51,7 @@ TEST(setExpiryforFile, ReturnsErrnoOfRefusedWriteExceptForZipCopy) {
 
 TEST(isNewFileCase, ComparesOpeningAgeWithoutOverflow) {
     FreshProcessMap map;
-    ChildProcess office("com.hancom.office.viewer");
+    NamedProcess office("com.hancom.office.viewer");
     const struct {
         long now, openTime;
         bool newFile;

@@ -8,7 +8,7 @@
 #include <cstdlib>
 #include <thread>
 
-#include "support/command_vector.h"
+#include "command_vector.h"
 #include "support/duration_database.h"
 #include "support/scratch_directory.h"
 
@@ -25,8 +25,8 @@ TEST(LibraryLock, CallsRacingTheExitWait) {
             std::thread([pid, path = std::string(file), name = std::to_string(pid)]() mutable {
                 // The maps grow, so that their destruction takes a while.
                 for (int round = 0;; ++round, ++rounds) {
-                    runCommand({"4", "0", std::to_string(pid * 100000 + round), path});
-                    setExpiryforFile(pid, path.data(), 150), runCommand({"1", name}),
+                    runCommandVector({"4", "0", std::to_string(pid * 100000 + round), path});
+                    setExpiryforFile(pid, path.data(), 150), runCommandVector({"1", name}),
                             putPendingInodeValue(pid * 100000UL + round, pid),
                             get_expiryAfter_time(150);
                 }

@@ -4,7 +4,7 @@
 
 #include <climits>
 
-#include "support/child_process.h"
+#include "named_process.h"
 #include "support/duration_database.h"
 #include "support/log_capture.h"
 
@@ -13,11 +13,11 @@ namespace dlp::test {
 TEST(getProcessNameByPid, TheFirstArgumentOfTheCommandLine) {
     if (!databaseIsThrowaway()) GTEST_SKIP() << "mounts over /proc: runs only in tools/dlp-sandbox";
     // Every child carries a second argument, its sleep time.
-    ChildProcess app("com.vux.android.gallery3d");
-    ChildProcess longName(std::string(254, 'a') + std::string(46, 'b'));
-    ChildProcess zombie("com.hancom.office.viewer");
+    NamedProcess app("com.vux.android.gallery3d");
+    NamedProcess longName(std::string(254, 'a') + std::string(46, 'b'));
+    NamedProcess zombie("com.hancom.office.viewer");
     zombie.killWithoutReaping();
-    ChildProcess unreadable("com.vux.android.app.filbrook");
+    NamedProcess unreadable("com.vux.android.app.filbrook");
     // A command line that opens but cannot be read: the memory file reads address 0, EIO.
     std::string proc = "/proc/" + std::to_string(unreadable.pid());
     ASSERT_EQ(

@@ -2,8 +2,8 @@
 
 #include <tuple>
 
+#include "named_process.h"
 #include "processmap/process_map_internal.h"
-#include "support/child_process.h"
 #include "support/log_capture.h"
 #include "support/process_map_reset.h"
 
@@ -49,7 +49,7 @@ TEST(HashMap_put, KeepsTheLastEntryPerExtensionAndRefusesNegativeExpiryOrUnprote
 
 TEST(HashMap_get, TakesTheArchiveTheExactOrTheRelatedEntry) {
     FreshProcessMap fresh;
-    ChildProcess fileManager("com.vux.android.app.filbrook"),
+    NamedProcess fileManager("com.vux.android.app.filbrook"),
             zipFirst("com.vux.android.app.filbrook"), remote("com.vux.android.app.filbrook:remote");
     const int manager = fileManager.pid(), first = zipFirst.pid(), suffixed = remote.pid();
     LibraryLockGuard guard;

@@ -2,8 +2,8 @@
 
 #include <ctime>
 
+#include "named_process.h"
 #include "processmap/process_map_internal.h"
-#include "support/child_process.h"
 #include "support/log_capture.h"
 #include "support/process_map_reset.h"
 
@@ -27,7 +27,7 @@ TEST(HashMap_isRejectedPid, SortsProcessesByName) {
     for (auto [name, expiresIn, rejected, entriesRemoved, recordedAsFileManager] : rows) {
         SCOPED_TRACE(std::string(name) + " expiring in " + std::to_string(expiresIn));
         FreshProcessMap fresh;
-        ChildProcess child(name);
+        NamedProcess child(name);
         const int pid = child.pid();
         const MapEntry entry{pid, "pdf", time(nullptr) + expiresIn, 1};
         LibraryLockGuard guard;
@@ -42,7 +42,7 @@ TEST(HashMap_isRejectedPid, SortsProcessesByName) {
 TEST(HashMap_isRejectedPid, RemembersARejectedPidWithoutNamingItAgain) {
     FreshProcessMap fresh;
     // Gone and reaped: even a whitelisted name no longer counts.
-    const int ended = ChildProcess("com.vux.android.gallery3d").pid();
+    const int ended = NamedProcess("com.vux.android.gallery3d").pid();
     const MapEntry entry{ended, "pdf", time(nullptr) + 3600, 1};
     LibraryLockGuard guard;
     EXPECT_TRUE(mProcessMap.isRejectedPid(ended, entry));

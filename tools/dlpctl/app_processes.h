@@ -3,18 +3,15 @@
 #include <sys/types.h>
 
 #include <map>
-#include <set>
+#include <memory>
 #include <string>
 
-// The app processes that a trace declares: sleeping children whose argv[0] is the app's name,
-// each standing in for a pid that the trace names. All still running die with this object.
+#include "named_process.h"
+
+// The app processes that a trace declares, each standing in for a pid that the trace names. All
+// still running die with this object.
 class AppProcesses {
   public:
-    AppProcesses() = default;
-    ~AppProcesses();
-    AppProcesses(const AppProcesses&) = delete;
-    AppProcesses& operator=(const AppProcesses&) = delete;
-
     // Starts the child that stands for `tracePid`: its real pid, or -1 and the reason in `error`.
     pid_t start(int tracePid, const std::string& name, std::string& error);
     // Kills and reaps the child of `tracePid`; false when it has none running.
@@ -24,5 +21,5 @@ class AppProcesses {
 
   private:
     std::map<int, pid_t> realPids_;
-    std::set<pid_t> running_;
+    std::map<pid_t, std::unique_ptr<NamedProcess>> running_;
 };

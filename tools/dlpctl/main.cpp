@@ -15,6 +15,7 @@
 #include <string>
 #include <vector>
 
+#include "command_vector.h"
 #include "demo.h"
 #include "expiry_text.h"
 #include "file_expiry.h"

@@ -1,7 +1,6 @@
 #include "trace.h"
 
 #include <android-base/unique_fd.h>
-#include <dlp_sdk/commands.h>
 #include <dlp_sdk/expiry_attribute.h>
 #include <dlp_sdk/new_file_expiry.h>
 #include <fcntl.h>
@@ -16,6 +15,7 @@
 #include <optional>
 
 #include "app_processes.h"
+#include "command_vector.h"
 #include "expiry_text.h"
 #include "file_expiry.h"
 #include "replay_clock.h"
@@ -221,14 +221,6 @@ bool meets(const std::string& result, const std::string& expected) {
 }
 
 }  // namespace
-
-int runCommandVector(std::vector<std::string> arguments) {
-    arguments.insert(arguments.begin(), "dlpctl");
-    std::vector<char*> argv;
-    for (std::string& argument : arguments) argv.push_back(argument.data());
-    argv.push_back(nullptr);
-    return handleDLPCommands(static_cast<int>(arguments.size()), argv.data());
-}
 
 int replayTrace(std::istream& input, const std::string& traceName, bool echoComments) {
     TracePlayer player;
