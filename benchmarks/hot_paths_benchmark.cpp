@@ -38,21 +38,21 @@ constexpr const char* kExpiryAttribute = "user.zorvat_dlp";
 constexpr size_t kExpiryValueSize = 16;
 constexpr int kContainerId = 120;
 constexpr int kDurationSeconds = 86400;
-constexpr long kWeekSeconds = 7 * 86400;
+constexpr int64_t kWeekSeconds = 7 * 86400;
 constexpr int kProcessCounts[] = {10, 10000, 100000};
 // A zip copy rewrites a stamp that lies at most this far ahead; the source zip expires this far
 // ahead, so every timed call of one run writes.
-constexpr long kZipCopyWindowSeconds = 20;
+constexpr int64_t kZipCopyWindowSeconds = 20;
 
 using ExpiryValue = std::vector<unsigned char>;
 
 // The expiry on the file, -1 when it has none.
-long storedExpiry(const std::string& path) {
+int64_t storedExpiry(const std::string& path) {
     ExpiryValue value = dlp::test::readAttribute(path);
     if (value.size() != kExpiryValueSize) return -1;
     uint64_t bits = 0;
     for (size_t i = 0; i < 8; ++i) bits |= static_cast<uint64_t>(value[i]) << (8 * i);
-    return static_cast<long>(bits);
+    return static_cast<int64_t>(bits);
 }
 
 void forgetProcess(pid_t pid) {
@@ -60,7 +60,7 @@ void forgetProcess(pid_t pid) {
 }
 
 // Whether the pid's most recent entry is the file just reported.
-bool storedLast(pid_t pid, const std::string& extension, long expiry) {
+bool storedLast(pid_t pid, const std::string& extension, int64_t expiry) {
     dlp::LibraryLockGuard guard;
     auto slot = HashMap::mInternalProcessMap.find(pid);
     if (slot == HashMap::mInternalProcessMap.end()) return false;
@@ -98,17 +98,17 @@ class DatabaseAside {
 
 // The files and app processes that the cases act on, built once for the whole run.
 struct Scene {
-    long start = getCurrentTimeInSec();
+    int64_t start = getCurrentTimeInSec();
     dlp::test::ScratchDirectory directory;
     NamedProcess office{"com.hancom.office.viewer"};
     NamedProcess notes{"org.example.notes"};
     NamedProcess fileManager{"com.vux.android.app.filbrook"};
 
-    long protectedExpiry = start + kWeekSeconds;
+    int64_t protectedExpiry = start + kWeekSeconds;
     std::string protectedFile = directory.file("protected.docx", protectedExpiry);
     std::string plainFile = directory.file("plain.docx");
 
-    long officeOpenedExpiry = start + kWeekSeconds + 1;
+    int64_t officeOpenedExpiry = start + kWeekSeconds + 1;
     std::string officeOpened = directory.file("report.docx", officeOpenedExpiry);
     std::string officeCreated = directory.file("report-copy.doc");
 
@@ -219,10 +219,10 @@ void rejectedCreate(benchmark::State& state, LogConfiguration configuration) {
     {
         DatabaseAside aside;
         if (!aside.moved()) return state.SkipWithError("cannot move the database aside");
-        long before = getCurrentTimeInSec();
+        int64_t before = getCurrentTimeInSec();
         int result = setExpiryforFile(pid, created.data(), kContainerId);
-        long after = getCurrentTimeInSec();
-        long expiry = storedExpiry(created);
+        int64_t after = getCurrentTimeInSec();
+        int64_t expiry = storedExpiry(created);
         if (result != 0 || expiry < before + kDurationSeconds ||
             expiry > after + kDurationSeconds) {
             return state.SkipWithError("the new file did not get now + the cached duration");
@@ -252,7 +252,7 @@ void zipCopy(benchmark::State& state, LogConfiguration configuration) {
     applyLogConfiguration(configuration);
     pid_t pid = scene->fileManager.pid();
     std::string created = scene->archiveCreated;
-    long openedExpiry = getCurrentTimeInSec() + kZipCopyWindowSeconds;
+    int64_t openedExpiry = getCurrentTimeInSec() + kZipCopyWindowSeconds;
     dlp::test::writeAttribute(scene->archiveOpened, expiryValue(openedExpiry));
     forgetProcess(pid);
     runCommandVector({"4", "0", std::to_string(pid), scene->archiveOpened});

@@ -25,7 +25,7 @@ namespace {
 
 // Valid pids that no process of the sandbox reaches.
 constexpr int kFirstPid = 1000000;
-constexpr long kWeekSeconds = 7 * 86400;
+constexpr int64_t kWeekSeconds = 7 * 86400;
 const char* const kOpenedExtensions[] = {"pdf", "docx"};
 
 struct StoredPopulation {
@@ -58,7 +58,7 @@ void fill(ProcessMapPopulation& population, int processCount) {
     std::vector<int> pids(processCount);
     std::iota(pids.begin(), pids.end(), kFirstPid);
     std::shuffle(pids.begin(), pids.end(), random);
-    long now = getCurrentTimeInSec();
+    int64_t now = getCurrentTimeInSec();
     applyLogConfiguration(LogConfiguration::kSilenced);
     // A fresh thread starts with an empty glibc thread cache and gives it back when it ends, so
     // chunks that wait there freed, before or after, count neither as taken nor as in use. Its

@@ -106,12 +106,35 @@ set_standard_library_aside() {
   sed -e 's/std::__cxx11::/std::/g' -e 's/std::__1::/std::/g' -e 's/\[abi:cxx11\]//g' | sort
 }
 
+# The map's patterns take either width of a 64-bit integer; each ABI must export its own: long on
+# the 64-bit ABIs, as they always have, long long on the 32-bit ones.
+check_64_bit_parameters() {
+  local library=$1 exports=$2 int64 name
+  case $(od -An -j4 -N1 -tu1 "$library" | tr -d ' ') in
+    1) int64='long long' ;;
+    2) int64=long ;;
+    *)
+      echo "check-exports: $library is not an ELF library" >&2
+      return 1
+      ;;
+  esac
+  for name in "putPendingInodeValue(unsigned $int64, int)" "getPidByInode(unsigned $int64)" \
+      "clearPendingInode(unsigned $int64)" "isNewFileCase(MapEntry, char*, $int64, int)"; do
+    if ! grep -qxF "function $name" <<<"$exports"; then
+      echo "check-exports: $library does not export $name" >&2
+      return 1
+    fi
+  done
+}
+
 library=$1
 first=$(exports_of "$library")
+check_64_bit_parameters "$library" "$first"
 echo "check-exports: $library exports the ${#entries[@]} entries of dlp/exports.map, nothing else"
 if (($# == 2)); then
   other=$2
   second=$(exports_of "$other")
+  check_64_bit_parameters "$other" "$second"
   echo "check-exports: $other exports the ${#entries[@]} entries of dlp/exports.map, nothing else"
   if ! diff -u --label "$library" --label "$other" <(set_standard_library_aside <<<"$first") \
       <(set_standard_library_aside <<<"$second"); then

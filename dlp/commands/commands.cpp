@@ -82,11 +82,12 @@ std::optional<int> parseNumber(char* const* argv, int index) {
     return negative ? static_cast<int>(0ull - magnitude) : static_cast<int>(magnitude);
 }
 
-// strtol's reading in base 0 ("0x" hexadecimal, a leading "0" octal), refused outside long.
-std::optional<long> parseExpiry(char* const* argv, int index) {
+// strtol's reading in base 0 ("0x" hexadecimal, a leading "0" octal), over 64 bits on every ABI,
+// refused outside them.
+std::optional<int64_t> parseExpiry(char* const* argv, int index) {
     int savedErrno = errno;
     errno = 0;
-    long expiry = strtol(argv[index], nullptr, 0);
+    int64_t expiry = strtoll(argv[index], nullptr, 0);
     bool outOfRange = errno == ERANGE;
     errno = savedErrno;
     if (outOfRange) return refuseOutOfRange(argv, index);
@@ -102,7 +103,7 @@ bool isPathTooLong(const char* path) {
     return true;
 }
 
-int stampFile(int containerId, char* path, long expiry) {
+int stampFile(int containerId, char* path, int64_t expiry) {
     if (isPathTooLong(path)) return -1;
     std::string extension = getExtensionFromPath(path);
     {
@@ -206,7 +207,7 @@ int handleDLPCommands(int argc, char** argv) {
     }
     // Every number is read before anything changes, so a refused one changes nothing.
     std::optional<int> first, second;
-    std::optional<long> expiry;
+    std::optional<int64_t> expiry;
     switch (*command) {
         case DLP_CMD_PROCESS_REMOVE:
             if (!(first = parseNumber(argv, 2))) return -1;

@@ -12,8 +12,8 @@ bool addOrUpdateMapEntry(int pid, char* path) {
         return false;
     }
     std::string extension = getExtensionFromPath(path);
-    long expiry = get_dlp_file_expiry_time(path);
-    long now = getCurrentTimeInSec();
+    int64_t expiry = get_dlp_file_expiry_time(path);
+    int64_t now = getCurrentTimeInSec();
     if (expiry <= now) {
         DLP_SYSTEM_ERROR(
                 "DLP_LIBDLP : <HashMap::addOrUpdateMapEntry> curTime[%d], "

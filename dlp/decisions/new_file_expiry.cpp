@@ -2,6 +2,7 @@
 #include <dlp_sdk/new_file_expiry.h>
 
 #include <cerrno>
+#include <cinttypes>
 #include <cstdint>
 #include <cstring>
 
@@ -19,11 +20,11 @@ namespace {
 // An expiry from now to now + 20 s was put there by this very file event; any other expiry was
 // set on purpose by the file manager and stays.
 constexpr uint64_t kFreshExpiryWindow = 21;
-constexpr unsigned long kInheritableAge = 599;
+constexpr uint64_t kInheritableAge = 599;
 
-bool isExpiryAlreadySet(const char* path, long now, const char* caseName,
+bool isExpiryAlreadySet(const char* path, int64_t now, const char* caseName,
                         const char* alreadySetCaseName) {
-    long current = get_dlp_file_expiry_time(path);
+    int64_t current = get_dlp_file_expiry_time(path);
     // Unsigned on purpose, and free of overflow: an expiry already in the past counts as set.
     uint64_t difference = static_cast<uint64_t>(current) - static_cast<uint64_t>(now);
     DLP_SYSTEM_DEBUG(
@@ -42,7 +43,7 @@ bool isExpiryAlreadySet(const char* path, long now, const char* caseName,
 }
 
 // 0, or the errno that the failed write left.
-int writeExpiry(const char* path, long expiry) {
+int writeExpiry(const char* path, int64_t expiry) {
     int result = set_dlp_file_expiry_time(path, expiry);
     if (result >= 0) return 0;
     int error = errno != 0 ? errno : EIO;
@@ -52,14 +53,14 @@ int writeExpiry(const char* path, long expiry) {
     return error;
 }
 
-int stampZipCopy(int pid, const char* path, long now) {
+int stampZipCopy(int pid, const char* path, int64_t now) {
     if (isExpiryAlreadySet(path, now, "support 2.7 Zip copy", "support for 2.7 zip")) return 0;
     MapEntry last;
     {
         dlp::LibraryLockGuard guard;
         last = mProcessMap.getLastOpenedEntry(pid);
     }
-    long expiry;
+    int64_t expiry;
     if (last.value_extension == "zip") {
         DLP_SYSTEM_DEBUG(
                 "DLP_LIBDLP : <setExpiryforFile> support for 2.7 zip -- last opened entry is zip "
@@ -75,9 +76,9 @@ int stampZipCopy(int pid, const char* path, long now) {
     return 0;
 }
 
-bool isNewFileCaseLocked(const MapEntry& entry, long currentTime, int pid)
+bool isNewFileCaseLocked(const MapEntry& entry, int64_t currentTime, int pid)
         REQUIRES(dlp::libraryLock) {
-    long openTime = entry.value_opentime;
+    int64_t openTime = entry.value_opentime;
     if (dlp::isRejectedProcess(mProcessMap, pid, entry)) {
         DLP_SYSTEM_DEBUG(
                 "DLP_LIBDLP : <isNewFileCase> pid[%d] passed is in reject list do new file case",
@@ -86,8 +87,7 @@ bool isNewFileCaseLocked(const MapEntry& entry, long currentTime, int pid)
     }
     // currentTime - openTime > 599, as the arithmetic without overflow would answer.
     return currentTime > openTime &&
-           static_cast<unsigned long>(currentTime) - static_cast<unsigned long>(openTime) >
-                   kInheritableAge;
+           static_cast<uint64_t>(currentTime) - static_cast<uint64_t>(openTime) > kInheritableAge;
 }
 
 }  // namespace
@@ -98,17 +98,17 @@ int setExpiryforFile(int pid, char* path, int containerId) {
         return -1;
     }
     std::string extension = getExtensionFromPath(path);
-    long callTime = getCurrentTimeInSec();
+    int64_t callTime = getCurrentTimeInSec();
     char name[dlp::kProcessNameBufferSize];
     if (extension == "zip" && dlp::readProcessName(pid, name) == FILE_MANAGER_PACKAGE) {
         return stampZipCopy(pid, path, callTime);
     }
 
-    long lookupTime = getCurrentTimeInSec();
+    int64_t lookupTime = getCurrentTimeInSec();
     MapEntry related;
     bool inherits = false;
     bool fileManagerCase = false;
-    long newFileExpiry = 0;
+    int64_t newFileExpiry = 0;
     {
         dlp::LibraryLockGuard guard;
         related = mProcessMap.get(pid, std::move(extension));
@@ -119,7 +119,8 @@ int setExpiryforFile(int pid, char* path, int containerId) {
                               related.value_extension == dlp::kUnpackedFromZipExtension;
         }
         if (!inherits) {
-            newFileExpiry = lookupTime + static_cast<long>(dlp::expiryAfterTimeLocked(containerId));
+            newFileExpiry =
+                    lookupTime + static_cast<int64_t>(dlp::expiryAfterTimeLocked(containerId));
         }
     }
 
@@ -136,14 +137,14 @@ int setExpiryforFile(int pid, char* path, int containerId) {
 
     DLP_SYSTEM_DEBUG(
             "DLP_LIBDLP : <setExpiryforFile> NEWFILE CASE. pid[%d], file_path[%s]. Set IT admin's "
-            "expiry[%ld]",
+            "expiry[%" PRId64 "]",
             pid, path, newFileExpiry);
     int result = writeExpiry(path, newFileExpiry);
     if (result == 0) DLP_SYSTEM_DEBUG("DLP_LIBDLP : <setExpiryforFile> setxattr OK\n");
     return result;
 }
 
-bool isNewFileCase(MapEntry entry, char* /*path*/, long currentTime, int pid) {
+bool isNewFileCase(MapEntry entry, char* /*path*/, int64_t currentTime, int pid) {
     dlp::LibraryLockGuard guard;
     return isNewFileCaseLocked(entry, currentTime, pid);
 }

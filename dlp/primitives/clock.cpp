@@ -4,13 +4,13 @@
 
 #include <ctime>
 
-long getCurrentTimeInSec() {
+int64_t getCurrentTimeInSec() {
     timeval now{};
     gettimeofday(&now, nullptr);
     return now.tv_sec;
 }
 
-long getEndOfDay() {
+int64_t getEndOfDay() {
     time_t now = time(nullptr);
     tm local{};
     localtime_r(&now, &local);
@@ -19,5 +19,5 @@ long getEndOfDay() {
     local.tm_sec = 59;
     // Let mktime decide daylight saving for 23:59:59, which may differ from now's.
     local.tm_isdst = -1;
-    return static_cast<long>(mktime(&local));
+    return static_cast<int64_t>(mktime(&local));
 }

@@ -4,6 +4,7 @@
 #include <sys/xattr.h>
 
 #include <cerrno>
+#include <cinttypes>
 #include <cstdint>
 #include <cstring>
 
@@ -16,21 +17,21 @@ constexpr const char* kExpiryAttribute = "user.zorvat_dlp";
 // Signed 64-bit little-endian expiry in bytes 0-7; bytes 8-15 are reserved and written as zero.
 constexpr size_t kExpiryValueSize = 16;
 
-void encodeExpiry(long expiry, unsigned char (&value)[kExpiryValueSize]) {
+void encodeExpiry(int64_t expiry, unsigned char (&value)[kExpiryValueSize]) {
     memset(value, 0, sizeof(value));
     uint64_t bits = htole64(static_cast<uint64_t>(expiry));
     memcpy(value, &bits, sizeof(bits));
 }
 
-long decodeExpiry(const unsigned char (&value)[kExpiryValueSize]) {
+int64_t decodeExpiry(const unsigned char (&value)[kExpiryValueSize]) {
     uint64_t bits;
     memcpy(&bits, value, sizeof(bits));
-    return static_cast<long>(le64toh(bits));
+    return static_cast<int64_t>(le64toh(bits));
 }
 
 }  // namespace
 
-int set_dlp_file_expiry_time(const char* path, long expiry) {
+int set_dlp_file_expiry_time(const char* path, int64_t expiry) {
     // A null path fails like a call that the kernel refused.
     int result = -1;
     if (path != nullptr) {
@@ -50,7 +51,7 @@ int set_dlp_file_expiry_time(const char* path, long expiry) {
     return -1;
 }
 
-long get_dlp_file_expiry_time(const char* path) {
+int64_t get_dlp_file_expiry_time(const char* path) {
     unsigned char value[kExpiryValueSize];
     int result = -1;
     if (path != nullptr) {
@@ -70,8 +71,9 @@ long get_dlp_file_expiry_time(const char* path) {
                 path != nullptr ? path : "(null)", result, error, strerror(error));
         return dlp::kNoExpiry;
     }
-    long expiry = decodeExpiry(value);
-    DLP_PRIMITIVE_LOG("DLP_LIBDLP :  in get_dlp_file_expiry_time getxattr OK: [%ld]\n", expiry);
+    int64_t expiry = decodeExpiry(value);
+    DLP_PRIMITIVE_LOG("DLP_LIBDLP :  in get_dlp_file_expiry_time getxattr OK: [%" PRId64 "]\n",
+                      expiry);
     if (expiry > 0) return expiry;
     DLP_PRIMITIVE_LOG("DLP_LIBDLP :  dlp expiry time is <= 0 retunring -1");
     return dlp::kNoExpiry;

@@ -10,13 +10,13 @@ constexpr int kNotParked = -1;
 
 }  // namespace
 
-bool HashMap::addPendingInode(unsigned long inode, int pid) {
+bool HashMap::addPendingInode(uint64_t inode, int pid) {
     // The first pid parked for an inode stays.
     mPendingInodeMap.emplace(inode, pid);
     return true;
 }
 
-bool putPendingInodeValue(unsigned long inode, int pid) {
+bool putPendingInodeValue(uint64_t inode, int pid) {
     if (inode == 0 || pid < 0) {
         DLP_SYSTEM_ERROR(
                 "DLP_LIBDLP : <putPendingInodeValue> Invalid parameter inode/pid. Return false");
@@ -26,7 +26,7 @@ bool putPendingInodeValue(unsigned long inode, int pid) {
     return mProcessMap.addPendingInode(inode, pid);
 }
 
-int getPidByInode(unsigned long inode) {
+int getPidByInode(uint64_t inode) {
     if (inode == 0) {
         DLP_SYSTEM_ERROR("DLP_LIBDLP : <getPidByInode> Invalid parameter inode. Return false");
         return 0;
@@ -36,7 +36,7 @@ int getPidByInode(unsigned long inode) {
     return pair == HashMap::mPendingInodeMap.end() ? kNotParked : pair->second;
 }
 
-bool clearPendingInode(unsigned long inode) {
+bool clearPendingInode(uint64_t inode) {
     if (inode == 0) return false;
     dlp::LibraryLockGuard guard;
     HashMap::mPendingInodeMap.erase(inode);

@@ -6,7 +6,7 @@
 HashMap mProcessMap;
 std::map<int, std::vector<MapEntry>> HashMap::mInternalProcessMap;
 std::map<int, std::vector<MapEntry>>::iterator HashMap::mMapIterator;
-std::map<unsigned long, int> HashMap::mPendingInodeMap;
+std::map<uint64_t, int> HashMap::mPendingInodeMap;
 
 namespace {
 

@@ -230,9 +230,9 @@ int expiryAfterTimeLocked(int id) {
     return result;
 }
 
-long adminExpiryTimeLocked(int id) {
-    long now = time(nullptr);
-    return now + static_cast<long>(expiryAfterTimeLocked(id));
+int64_t adminExpiryTimeLocked(int id) {
+    int64_t now = time(nullptr);
+    return now + static_cast<int64_t>(expiryAfterTimeLocked(id));
 }
 
 }  // namespace dlp
@@ -264,7 +264,7 @@ int get_expiryAfter_time(int id) {
     return dlp::expiryAfterTimeLocked(id);
 }
 
-long getITAdminExpiryTime(int id) {
+int64_t getITAdminExpiryTime(int id) {
     dlp::LibraryLockGuard guard;
     return dlp::adminExpiryTimeLocked(id);
 }

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <cstdint>
+
 #include "primitives/library_lock.h"
 
 // The store's entry points for callers that already hold the library lock.
@@ -10,6 +12,6 @@ int setTimeLocked(int id, int time) REQUIRES(libraryLock);
 // get_expiryAfter_time: the duration, or 1 when none can be read.
 int expiryAfterTimeLocked(int id) REQUIRES(libraryLock);
 // getITAdminExpiryTime: now plus the container's duration.
-long adminExpiryTimeLocked(int id) REQUIRES(libraryLock);
+int64_t adminExpiryTimeLocked(int id) REQUIRES(libraryLock);
 
 }  // namespace dlp

@@ -2,6 +2,8 @@
 
 #include <dlp_sdk/export.h>
 
+#include <cstdint>
+
 // Per-container expiry-after durations, container ids 100 to 199.
 extern "C" {
 
@@ -14,4 +16,4 @@ DLP_EXPORT int get_expiryAfter_time(int id);            // as get_time, 1 instea
 }  // extern "C"
 
 // Now plus the container's duration, in seconds since the epoch.
-DLP_EXPORT long getITAdminExpiryTime(int id);
+DLP_EXPORT int64_t getITAdminExpiryTime(int id);

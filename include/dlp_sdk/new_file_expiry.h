@@ -9,4 +9,4 @@
 DLP_EXPORT int setExpiryforFile(int pid, char* path, int containerId);
 
 // True when `entry` must not lend its expiry to a new file of `pid`. `path` is not read.
-DLP_EXPORT bool isNewFileCase(MapEntry entry, char* path, long currentTime, int pid);
+DLP_EXPORT bool isNewFileCase(MapEntry entry, char* path, int64_t currentTime, int pid);

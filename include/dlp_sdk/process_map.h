@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <map>
 #include <string>
 #include <vector>
@@ -24,8 +25,8 @@
 struct MapEntry {
     int value_pid;
     std::string value_extension;
-    long value_expiry;    // seconds since the epoch
-    long value_opentime;  // seconds since the epoch
+    int64_t value_expiry;    // seconds since the epoch
+    int64_t value_opentime;  // seconds since the epoch
 };
 
 // The members that are not exported are the library's own; they run under its lock.
@@ -51,7 +52,7 @@ class HashMap {
     bool isWhitelistedProcess(std::string processName, MapEntry entry) DLP_REQUIRES_LIBRARY_LOCK;
     void checkAndDeleteProcessEntry(MapEntry entry) DLP_REQUIRES_LIBRARY_LOCK;
 
-    bool addPendingInode(unsigned long inode, int pid) DLP_REQUIRES_LIBRARY_LOCK;
+    bool addPendingInode(uint64_t inode, int pid) DLP_REQUIRES_LIBRARY_LOCK;
 
     std::vector<std::string> mDefaultExtensions;
     std::vector<std::string> mExtensionList DLP_GUARDED_BY_LIBRARY_LOCK;
@@ -62,7 +63,7 @@ class HashMap {
 
     DLP_EXPORT static std::map<int, std::vector<MapEntry>> mInternalProcessMap
             DLP_GUARDED_BY_LIBRARY_LOCK;
-    DLP_EXPORT static std::map<unsigned long, int> mPendingInodeMap DLP_GUARDED_BY_LIBRARY_LOCK;
+    DLP_EXPORT static std::map<uint64_t, int> mPendingInodeMap DLP_GUARDED_BY_LIBRARY_LOCK;
     DLP_EXPORT static std::map<int, std::vector<MapEntry>>::iterator mMapIterator
             DLP_GUARDED_BY_LIBRARY_LOCK;
 };

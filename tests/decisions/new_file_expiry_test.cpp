@@ -53,7 +53,7 @@ TEST(isNewFileCase, ComparesOpeningAgeWithoutOverflow) {
     FreshProcessMap map;
     NamedProcess office("com.hancom.office.viewer");
     const struct {
-        long now, openTime;
+        int64_t now, openTime;
         bool newFile;
     } cases[] = {{1000000599, 1000000000, false}, {1000000600, 1000000000, true},
                  {1000000000, 1000000600, false}, {LONG_MAX, LONG_MIN, true},

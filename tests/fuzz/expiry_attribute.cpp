@@ -20,11 +20,11 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     const char* file = stamped.c_str();
     removexattr(file, "user.zorvat_dlp");
     // Values the file system refuses (too long) leave the file without the attribute.
-    long expected = -1;
+    int64_t expected = -1;
     if (setxattr(file, "user.zorvat_dlp", data, size, 0) == 0 && size == 16) {
         uint64_t bits = 0;
         for (size_t i = 0; i < 8; ++i) bits |= static_cast<uint64_t>(data[i]) << (8 * i);
-        if (static_cast<long>(bits) > 0) expected = static_cast<long>(bits);
+        if (static_cast<int64_t>(bits) > 0) expected = static_cast<int64_t>(bits);
     }
     if (get_dlp_file_expiry_time(file) != expected) abort();
     return 0;

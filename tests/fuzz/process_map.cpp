@@ -27,7 +27,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     for (std::string line; std::getline(lines, line);) {
         if (line.size() < 3) continue;
         const int pid = static_cast<unsigned char>(line[1]) % 4;
-        const long expiry = static_cast<signed char>(line[2]) * 1000L;
+        const int64_t expiry = static_cast<signed char>(line[2]) * int64_t{1000};
         const std::string path = line.substr(3).c_str();
         const std::string extension = getExtensionFromPath(path.c_str());
         // The text after the last "." of the whole path, or the whole path, ASCII-lower-cased.

@@ -49,11 +49,15 @@ TEST(get_dlp_file_expiry_time, ResultsAndMessages) {
     const LogRecord notPositive = message("dlp expiry time is <= 0 retunring -1");
     // No value: the path does not exist; an empty one: the file has no attribute. Bytes 8-15 are
     // never read.
-    using Row = std::tuple<const char*, std::optional<Bytes>, long, Log>;
+    using Row = std::tuple<const char*, std::optional<Bytes>, int64_t, Log>;
     for (const auto& [path, value, result, messages] :
          {Row("valid",
               Bytes{0x88, 0x77, 0x66, 0x55, 0x44, 0x33, 0x22, 0x11, 9, 9, 9, 9, 9, 9, 9, 9},
               0x1122334455667788, Log{read("getxattr OK: [1234605616436508552]")}),
+          Row("year2040", expiryValue(2208988800), 2208988800,
+              Log{read("getxattr OK: [2208988800]")}),
+          Row("beyond", expiryValue(4295053696), 4295053696,
+              Log{read("getxattr OK: [4295053696]")}),
           Row("zero", expiryValue(0), -1, Log{read("getxattr OK: [0]"), notPositive}),
           Row("negative", expiryValue(-5), -1, Log{read("getxattr OK: [-5]"), notPositive}),
           Row("plain", Bytes{}, -1,

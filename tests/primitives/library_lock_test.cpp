@@ -27,7 +27,7 @@ TEST(LibraryLock, CallsRacingTheExitWait) {
                 for (int round = 0;; ++round, ++rounds) {
                     runCommandVector({"4", "0", std::to_string(pid * 100000 + round), path});
                     setExpiryforFile(pid, path.data(), 150), runCommandVector({"1", name}),
-                            putPendingInodeValue(pid * 100000UL + round, pid),
+                            putPendingInodeValue(pid * uint64_t{100000} + round, pid),
                             get_expiryAfter_time(150);
                 }
             }).detach();

@@ -9,7 +9,7 @@
 
 namespace dlp::test {
 
-using Fields = std::tuple<int, std::string, long, long>;
+using Fields = std::tuple<int, std::string, int64_t, int64_t>;
 using Entries = std::vector<Fields>;
 
 Fields fields(const MapEntry& entry) {
@@ -36,7 +36,7 @@ TEST(HashMap_put, KeepsTheLastEntryPerExtensionAndRefusesNegativeExpiryOrUnprote
     // -2^32 is negative in 64 bits, and 0 in the low 32 that the log shows.
     for (auto [entry, refusal] :
          {std::pair<MapEntry, const char*>{{2, "pdf", -1, 5}, "expiry is less than 0[-1]"},
-          {{2, "pdf", -(1L << 32), 5}, "expiry is less than 0[0]"},
+          {{2, "pdf", -(int64_t{1} << 32), 5}, "expiry is less than 0[0]"},
           {{2, "tmp", 10, 5}, "extension passed is not valid"}}) {
         EXPECT_FALSE(mProcessMap.put(2, entry));
         EXPECT_EQ(log.take().at(1), systemError(std::string("DLP_LIBDLP : <HashMap::put> ") +
@@ -53,7 +53,7 @@ TEST(HashMap_get, TakesTheArchiveTheExactOrTheRelatedEntry) {
             zipFirst("com.vux.android.app.filbrook"), remote("com.vux.android.app.filbrook:remote");
     const int manager = fileManager.pid(), first = zipFirst.pid(), suffixed = remote.pid();
     LibraryLockGuard guard;
-    using Opened = std::tuple<int, const char*, long>;
+    using Opened = std::tuple<int, const char*, int64_t>;
     for (auto [pid, extension, expiry] :
          {Opened{manager, "pdf", 11}, Opened{manager, "zip", 12}, Opened{suffixed, "pdf", 21},
           Opened{suffixed, "zip", 22}, Opened{first, "zip", 31}, Opened{first, "pdf", 32},

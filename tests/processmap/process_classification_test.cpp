@@ -13,9 +13,9 @@ using RejectList = std::map<int, std::string>;
 
 TEST(HashMap_isRejectedPid, SortsProcessesByName) {
     // (process name, expiry from now, rejected, entries removed, recorded as the file manager)
-    const std::tuple<const char*, long, bool, bool, bool> rows[] = {
+    const std::tuple<const char*, int64_t, bool, bool, bool> rows[] = {
             // Later than now in 64 bits, earlier in the low 32.
-            {"com.vux.android.gallery3d", (1L << 32) - 10, false, false, false},
+            {"com.vux.android.gallery3d", (int64_t{1} << 32) - 10, false, false, false},
             {"com.vux.android.gallery3d", 0, false, true, false},
             {"com.vux.android.app.filbrook", 3600, false, false, true},
             {"com.vux.android.app.filbrook", 0, false, true, true},

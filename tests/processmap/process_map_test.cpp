@@ -9,6 +9,10 @@ namespace dlp::test {
 
 using ProcessEntries = std::map<int, std::vector<MapEntry>>;
 
+// uint64_t is unsigned long on 64-bit ABIs, unsigned long long on 32-bit ones.
+constexpr const char* kPutPendingInodeValue =
+        sizeof(long) == 8 ? "_Z20putPendingInodeValuemi" : "_Z20putPendingInodeValueyi";
+
 template <typename Symbol>
 Symbol& symbol(void* library, const char* name) {
     return *reinterpret_cast<Symbol*>(dlsym(library, name));
@@ -32,8 +36,7 @@ TEST(HashMap, EveryLoadStartsFromTheSameState) {
         ASSERT_NE(library, nullptr) << dlerror();
         auto& map = symbol<HashMap>(library, "mProcessMap");
         auto& entries = symbol<ProcessEntries>(library, "_ZN7HashMap19mInternalProcessMapE");
-        auto& inodes =
-                symbol<std::map<unsigned long, int>>(library, "_ZN7HashMap16mPendingInodeMapE");
+        auto& inodes = symbol<std::map<uint64_t, int>>(library, "_ZN7HashMap16mPendingInodeMapE");
         std::string defaults;
         for (const std::string& extension : map.mDefaultExtensions) defaults += extension + " ";
         EXPECT_EQ(defaults,
@@ -48,7 +51,7 @@ TEST(HashMap, EveryLoadStartsFromTheSameState) {
                     ProcessEntries::iterator());
 
         EXPECT_EQ(command(library, {"dlp", "4", "0", std::to_string(getpid()), opened}), 0);
-        EXPECT_TRUE(symbol<bool(unsigned long, int)>(library, "_Z20putPendingInodeValuemi")(42, 7));
+        EXPECT_TRUE(symbol<bool(uint64_t, int)>(library, kPutPendingInodeValue)(42, 7));
         EXPECT_EQ(command(library, {"dlp", "5", "0", "abc,tmp"}), 0);
         EXPECT_EQ(command(library, {"dlp", "6", "100", "2"}), 0);
         EXPECT_EQ(entries.count(getpid()) + inodes.count(42), 2u);

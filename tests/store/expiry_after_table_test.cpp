@@ -184,7 +184,7 @@ TEST(get_expiryAfter_time, StoredMinusOneIsAFailureAndZeroADuration) {
     LogCapture log;
     EXPECT_EQ((Results{get_time(102), get_expiryAfter_time(102), get_expiryAfter_time(103)}),
               (Results{-1, 1, 0}));
-    const long now = time(nullptr), expiry = getITAdminExpiryTime(102);
+    const int64_t now = time(nullptr), expiry = getITAdminExpiryTime(102);
     EXPECT_TRUE(expiry >= now + 1 && expiry <= time(nullptr) + 1) << expiry - now;
     EXPECT_EQ(log.take(), Log(2, mainError("DLP_LOG : get id : 102 is fail\n")));
     EXPECT_EQ(database.rows("WHERE Id = 102"), (Rows{{102, -1}}));

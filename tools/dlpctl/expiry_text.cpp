@@ -47,7 +47,8 @@ std::string describeExpiry(int64_t expiry, int64_t now) {
     char when[64] = "beyond the calendar";
     time_t seconds = static_cast<time_t>(expiry);
     tm local{};
-    if (localtime_r(&seconds, &local) != nullptr) {
+    // A 32-bit time_t ends in 2038: a later expiry is not cut to a date of the past.
+    if (seconds == expiry && localtime_r(&seconds, &local) != nullptr) {
         strftime(when, sizeof(when), "%Y-%m-%d %H:%M:%S %Z", &local);
     }
     // Unsigned differences are exact here: the later minus the earlier of two 64-bit values.

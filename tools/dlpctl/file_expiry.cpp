@@ -20,7 +20,7 @@ FileExpiryReport systemError() {
 }  // namespace
 
 FileExpiryReport reportFileExpiry(const std::string& path, int64_t now) {
-    long expiry = get_dlp_file_expiry_time(path.c_str());
+    int64_t expiry = get_dlp_file_expiry_time(path.c_str());
     if (expiry > 0) return {true, describeExpiry(expiry, now)};
 
     unsigned char value[kExpiryValueSize];
