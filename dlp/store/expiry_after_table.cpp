@@ -62,7 +62,9 @@ int indexOf(int id) {
 // `label` names the caller as its messages do ("init_table:", "set_time :", "get_time :").
 Database openDatabase(const char* label) {
     sqlite3* handle = nullptr;
-    int result = sqlite3_open(kDatabasePath, &handle);
+    int result = sqlite3_open_v2(kDatabasePath, &handle,
+                                 SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE | SQLITE_OPEN_NOFOLLOW,
+                                 nullptr);
     Database database(handle);
     if (result != SQLITE_OK) {
         DLP_PRIMITIVE_LOG("DLP_LIBEPM : %s Cannot open database: %s\n", label,
@@ -73,13 +75,10 @@ Database openDatabase(const char* label) {
     return database;
 }
 
-// The id's row, or a null statement (logged) when the query cannot be prepared.
-Statement selectDuration(sqlite3* database, int id, const char* label) {
+// The id's row, or a null statement when the query cannot be prepared (sqlite3_errmsg says why).
+Statement selectDuration(sqlite3* database, int id) {
     sqlite3_stmt* handle = nullptr;
     if (sqlite3_prepare_v2(database, kSelectDuration, -1, &handle, nullptr) != SQLITE_OK) {
-        DLP_PRIMITIVE_LOG("DLP_LIBEPM : %s Failed to execute statement: %s\n", label,
-                          sqlite3_errmsg(database));
-        sqlite3_finalize(handle);
         return nullptr;
     }
     Statement statement(handle);
@@ -129,12 +128,45 @@ LookUp step(sqlite3* database, sqlite3_stmt* statement, SqliteText& error) {
     return LookUp::kFailed;
 }
 
+// What a file of this mode is, for the message that refuses it; null for a regular file.
+const char* kindOfNonRegularFile(mode_t mode) {
+    switch (mode & S_IFMT) {
+        case S_IFREG:
+            return nullptr;
+        case S_IFDIR:
+            return "a directory";
+        case S_IFLNK:
+            return "a symbolic link";
+        case S_IFIFO:
+            return "a FIFO";
+        case S_IFSOCK:
+            return "a socket";
+        case S_IFCHR:
+            return "a character device";
+        case S_IFBLK:
+            return "a block device";
+    }
+    return "of an unknown kind";
+}
+
 int initTableLocked() REQUIRES(dlp::libraryLock) {
-    {
-        android::base::unique_fd existing(open(kDatabasePath, O_RDONLY | O_CLOEXEC));
+    // What sits at the database path is looked at without following a link and opened without
+    // waiting: a FIFO would otherwise hold the library lock for good.
+    struct stat status {};
+    if (lstat(kDatabasePath, &status) == 0) {
+        if (const char* kind = kindOfNonRegularFile(status.st_mode)) {
+            DLP_PRIMITIVE_LOG("DLP_LIBEPM : init_table : %s is %s, not a database file\n",
+                              kDatabasePath, kind);
+            return 1;
+        }
+        android::base::unique_fd existing(
+                open(kDatabasePath, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
         if (existing.ok()) return 0;
     }
-    if (mkdir(kDatabaseDirectory, 0777) != 0 && errno != EEXIST) {
+    if (mkdir(kDatabaseDirectory, 0700) == 0) {
+        // The umask must not decide who may reach the durations.
+        chmod(kDatabaseDirectory, 0700);
+    } else if (errno != EEXIST) {
         DLP_PRIMITIVE_LOG("DLP_LIBEPM : init_table : Cannot create directory %s: %s\n",
                           kDatabaseDirectory, strerror(errno));
     }
@@ -175,10 +207,13 @@ int setTimeLocked(int id, int time) {
     };
     WriteTransaction transaction(database.get());
     if (!transaction.begin(error)) return failed();
-    LookUp found = LookUp::kNoRow;
-    if (Statement select = selectDuration(database.get(), id, "set_time :")) {
-        found = step(database.get(), select.get(), error);
+    Statement select = selectDuration(database.get(), id);
+    // A look-up that fails must not pass for a missing row: that would add a second row for the id.
+    if (!select) {
+        error.reset(sqlite3_mprintf("%s", sqlite3_errmsg(database.get())));
+        return failed();
     }
+    LookUp found = step(database.get(), select.get(), error);
     SqliteText sql;
     if (found == LookUp::kRow) {
         sql.reset(sqlite3_mprintf("Update dlpInfo Set Time = %d Where Id = %d", time, id));
@@ -188,7 +223,6 @@ int setTimeLocked(int id, int time) {
                 time);
         sql.reset(sqlite3_mprintf("INSERT INTO dlpInfo VALUES(%d, %d)", id, time));
     }
-    // A failed look-up must not pass for a missing row: that would add a second row for the id.
     if (found == LookUp::kFailed || !sql || !execute(database.get(), sql.get(), error) ||
         !transaction.commit(error)) {
         return failed();
@@ -206,7 +240,11 @@ int getTimeLocked(int id) {
     if (initTableLocked() == 1) return -1;
     Database database = openDatabase("get_time :");
     if (!database) return -1;
-    Statement select = selectDuration(database.get(), id, "get_time :");
+    Statement select = selectDuration(database.get(), id);
+    if (!select) {
+        DLP_PRIMITIVE_LOG("DLP_LIBEPM : get_time : Failed to execute statement: %s\n",
+                          sqlite3_errmsg(database.get()));
+    }
     SqliteText error;
     LookUp found = select ? step(database.get(), select.get(), error) : LookUp::kNoRow;
     if (found == LookUp::kRow) {

@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/mount.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -9,6 +10,7 @@
 #include <ctime>
 #include <fstream>
 #include <functional>
+#include <utility>
 
 #include "support/duration_database.h"
 #include "support/log_capture.h"
@@ -44,6 +46,20 @@ int storeEach(int first, int last, int duration) {
 }
 
 const auto store = [](const std::string& text) { return mainError("DLP_LIBEPM : " + text); };
+
+// SQLite's allocation this many calls from now fails, once; 0 fails none. Set before SQLite starts.
+int allocationsToFailure = 0;
+const auto failsNow = [] { return allocationsToFailure > 0 && --allocationsToFailure == 0; };
+sqlite3_mem_methods standard, failing;
+const bool kFailingAllocator = [] {
+    sqlite3_config(SQLITE_CONFIG_GETMALLOC, &standard);
+    failing = standard;
+    failing.xMalloc = [](int size) { return failsNow() ? nullptr : standard.xMalloc(size); };
+    failing.xRealloc = [](void* block, int size) {
+        return failsNow() ? nullptr : standard.xRealloc(block, size);
+    };
+    return sqlite3_config(SQLITE_CONFIG_MALLOC, &failing) == SQLITE_OK;
+}();
 
 // The tests share one database, in this order; the first finds none.
 TEST(set_time, AcceptsIds100To199AndKeepsOneRowEach) {
@@ -112,6 +128,25 @@ TEST(set_time, ConcurrentWritersKeepOneRowPerId) {
     EXPECT_EQ(DurationDatabase().rows("WHERE Id = 170"), (Rows{{170, 5}}));
 }
 
+// Whichever allocation fails: a 0 is the new value alone on disk, a 1 the old one; a read in a
+// fresh process gives the stored value or -1.
+TEST(set_time, AFailedAllocationNeverAddsARow) {
+    SKIP_UNLESS_DATABASE_IS_THROWAWAY();
+    ASSERT_TRUE(kFailingAllocator);
+    for (int nth = 1, left = 0; left == 0; ++nth) {
+        DurationDatabase().execute(
+                "DELETE FROM dlpInfo WHERE Id<102; INSERT INTO dlpInfo VALUES(100,111),(101,33)");
+        LogCapture log;
+        allocationsToFailure = nth;
+        int result = set_time(100, 222);
+        left = std::exchange(allocationsToFailure, 0);
+        EXPECT_EQ(DurationDatabase().rows("WHERE Id = 100"), (Rows{{100, result ? 111 : 222}}))
+                << nth;
+        int read = inProcesses({[nth] { return allocationsToFailure = nth, get_time(101); }})[0];
+        EXPECT_TRUE(read == 33 << 8 || read == 255 << 8) << nth << ": " << (read >> 8);
+    }
+}
+
 TEST(set_time, KilledAmidWritesLeavesOneRowPerId) {
     SKIP_UNLESS_DATABASE_IS_THROWAWAY();
     ASSERT_EQ(inProcesses({[] { return storeEach(100, 199, 1111); }}), Results{0});
@@ -132,6 +167,30 @@ TEST(set_time, KilledAmidWritesLeavesOneRowPerId) {
     }
     // The tests after this one start without a database.
     ASSERT_EQ(unlink(kDatabasePath), 0);
+}
+
+// What is not a regular file at its path is refused at once, never followed or waited for; its
+// directory is its owner's alone whatever the umask.
+TEST(init_table, RefusesWhatIsNotARegularFile) {
+    SKIP_UNLESS_DATABASE_IS_THROWAWAY();
+    setenv("DATABASE", kDatabasePath, 1);
+    for (const auto& [make, kind] :
+         {std::pair("mkfifo $DATABASE", "a FIFO"), std::pair("mkdir $DATABASE", "a directory"),
+          std::pair("ln -s elsewhere.db $DATABASE", "a symbolic link"),
+          std::pair("mknod $DATABASE c 1 3", "a character device")}) {
+        LogCapture log;
+        EXPECT_EQ((Results{system(make), init_table(), remove(kDatabasePath)}), (Results{0, 1, 0}));
+        EXPECT_EQ(log.take(), Log{store(std::string("init_table : ") + kDatabasePath + " is " +
+                                        kind + ", not a database file\n")});
+    }
+    for (mode_t mask : {0777, 0}) {
+        ASSERT_EQ(system("rm -r /data/system/users/dlp"), 0);
+        mode_t old = umask(mask);
+        EXPECT_EQ(init_table(), 0);
+        umask(old);
+        struct stat made {};
+        EXPECT_EQ(stat("/data/system/users/dlp", &made) == 0 ? made.st_mode & 07777 : 0, 0700u);
+    }
 }
 
 TEST(init_table, TakesAnExistingFileWithoutTheTableAsReady) {
