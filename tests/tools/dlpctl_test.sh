@@ -39,10 +39,16 @@ while IFS='|' read -r status arguments stdin stderr; do
 done <<'CASES'
 2|replay -|create 7 a.doc x|dlpctl: -:1: bad number 'x'
 2|replay -|show "a.doc|dlpctl: -:1: unterminated quote
+2|replay -|file first.doc\nshow /etc/hostname|dlpctl: -:2: path '/etc/hostname' lies outside the working directory and /data
+2|replay -|file first.doc\n4 0 7 docs/../first.doc|dlpctl: -:2: path 'docs/../first.doc' has a '..' component
 2|||usage: dlpctl*
 2|--bogus show none||dlpctl: unknown option --bogus*
 2|stamp report +1y||dlpctl: stamp: bad expiry '+1y'*
 CASES
+ln -s target.doc link.doc # a trace writes through no link, and a refused one writes nothing
+check "file, a link" 1 "1: file link.doc -> error: cannot create link.doc: Too many levels of symbolic links" \
+    "dlpctl: -:1: cannot create link.doc: Too many levels of symbolic links" "$dlpctl" replay - <<<"file link.doc"
+[[ ! -e target.doc && ! -e first.doc ]] || fail "a trace wrote target.doc or first.doc"
 for verb in show stamp cmd replay demo; do [[ $("$dlpctl" $verb --help) == "usage: dlpctl"* ]] || fail "$verb --help"; done
 
 # Outside the sandbox, that is where /data/system/users is no tmpfs, the database verbs refuse.

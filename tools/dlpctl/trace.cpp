@@ -4,6 +4,7 @@
 #include <dlp_sdk/expiry_attribute.h>
 #include <dlp_sdk/new_file_expiry.h>
 #include <fcntl.h>
+#include <sys/stat.h>
 
 #include <algorithm>
 #include <cctype>
@@ -104,6 +105,29 @@ int64_t expiry(const std::string& text) {
     return *value;
 }
 
+// A trace comes from elsewhere: it may name files under the working directory and /data alone.
+void checkPath(const std::string& path, std::string workingDirectory) {
+    if (("/" + path + "/").find("/../") != std::string::npos) {
+        throw MalformedLine{"path '" + path + "' has a '..' component"};
+    }
+    if (path[0] != '/') return;
+    if (workingDirectory.back() != '/') workingDirectory += '/';
+    for (const std::string& allowed : {workingDirectory, std::string("/data/")}) {
+        if (path.compare(0, allowed.size(), allowed) == 0) return;
+    }
+    throw MalformedLine{"path '" + path + "' lies outside the working directory and /data"};
+}
+
+// Which word of a line names a file, 0 for none: the path of create, show, file and commands 2
+// and 4.
+size_t pathWord(const std::vector<Word>& words) {
+    if (words.empty()) return 0;
+    std::optional<int> command = parseNumber(words[0].text);
+    if (words[0].text == "create" || command == 2) return 2;
+    if (words[0].text == "show" || words[0].text == "file") return 1;
+    return command == 4 ? 3 : 0;
+}
+
 std::string showResult(const std::string& path) {
     FileExpiryReport report = reportFileExpiry(path, replay_clock::now());
     return report.ok ? report.text : "error: " + report.text;
@@ -185,12 +209,23 @@ class TracePlayer {
         return "exited";
     }
 
+    // Neither the file nor a directory on its way is followed when it is a symbolic link.
     static void makeFile(const std::string& path) {
-        std::filesystem::path parent = std::filesystem::path(path).parent_path();
-        std::error_code ignored;
-        if (!parent.empty()) std::filesystem::create_directories(parent, ignored);
+        android::base::unique_fd directory(
+                open(path[0] == '/' ? "/" : ".", O_PATH | O_DIRECTORY | O_CLOEXEC));
+        size_t start = path.find_first_not_of('/');
+        for (size_t end; (end = path.find('/', start)) != std::string::npos;
+             start = path.find_first_not_of('/', end)) {
+            std::string name = path.substr(start, end - start);
+            mkdirat(directory.get(), name.c_str(), 0777);
+            directory.reset(openat(directory.get(), name.c_str(),
+                                   O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+            if (!directory.ok()) break;
+        }
+        std::string name = start == std::string::npos ? "" : path.substr(start);
         android::base::unique_fd created(
-                open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644));
+                openat(directory.get(), name.c_str(),
+                       O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC, 0644));
         if (!created.ok()) throw FailedLine{"cannot create " + path + ": " + strerror(errno)};
     }
 
@@ -229,14 +264,34 @@ int replayTrace(std::istream& input, const std::string& traceName, bool echoComm
         fflush(stdout);
         fprintf(stderr, "dlpctl: %s:%d: %s\n", traceName.c_str(), lineNumber, message.c_str());
     };
-    std::string line;
-    for (int lineNumber = 1; std::getline(input, line); ++lineNumber) {
-        TraceLine parsed;
+    std::vector<std::string> lines;
+    for (std::string line; std::getline(input, line);) lines.push_back(std::move(line));
+    if (input.bad()) {
+        fprintf(stderr, "dlpctl: %s: cannot read the trace\n", traceName.c_str());
+        return 1;
+    }
+    // Every line is parsed and its paths checked before the first is applied, so that a trace
+    // that is refused has written nothing.
+    std::vector<TraceLine> parsedLines;
+    std::string workingDirectory = std::filesystem::current_path().string();
+    for (size_t index = 0; index < lines.size(); ++index) {
+        try {
+            const std::vector<Word>& words =
+                    parsedLines.emplace_back(splitLine(lines[index])).words;
+            size_t path = pathWord(words);
+            if (path != 0 && path < words.size()) checkPath(words[path].text, workingDirectory);
+        } catch (const MalformedLine& malformed) {
+            report(static_cast<int>(index) + 1, malformed.message);
+            return 2;
+        }
+    }
+    for (int lineNumber = 1; lineNumber <= static_cast<int>(lines.size()); ++lineNumber) {
+        const std::string& line = lines[lineNumber - 1];
+        const TraceLine& parsed = parsedLines[lineNumber - 1];
         std::string text;
         std::string result;
         std::string failure;
         try {
-            parsed = splitLine(line);
             if (parsed.words.empty()) {
                 size_t start = line.find_first_not_of(" \t\r");
                 if (echoComments && start != std::string::npos) printf("%s\n", &line[start]);
@@ -266,9 +321,5 @@ int replayTrace(std::istream& input, const std::string& traceName, bool echoComm
         }
     }
     fflush(stdout);
-    if (input.bad()) {
-        fprintf(stderr, "dlpctl: %s: cannot read the trace\n", traceName.c_str());
-        return 1;
-    }
     return allMet ? 0 : 1;
 }
