@@ -78,10 +78,9 @@ Database openDatabase(const char* label) {
 // The id's row, or a null statement when the query cannot be prepared (sqlite3_errmsg says why).
 Statement selectDuration(sqlite3* database, int id) {
     sqlite3_stmt* handle = nullptr;
-    if (sqlite3_prepare_v2(database, kSelectDuration, -1, &handle, nullptr) != SQLITE_OK) {
-        return nullptr;
-    }
+    int result = sqlite3_prepare_v2(database, kSelectDuration, -1, &handle, nullptr);
     Statement statement(handle);
+    if (result != SQLITE_OK) return nullptr;
     sqlite3_bind_int(statement.get(), 1, id);
     return statement;
 }
