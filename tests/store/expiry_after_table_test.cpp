@@ -247,6 +247,9 @@ TEST(get_expiryAfter_time, StoredMinusOneIsAFailureAndZeroADuration) {
     EXPECT_TRUE(expiry >= now + 1 && expiry <= time(nullptr) + 1) << expiry - now;
     EXPECT_EQ(log.take(), Log(2, mainError("DLP_LOG : get id : 102 is fail\n")));
     EXPECT_EQ(database.rows("WHERE Id = 102"), (Rows{{102, -1}}));
+    // A stored -1 is never cached: the next read finds what replaced it.
+    ASSERT_EQ(database.execute("UPDATE dlpInfo SET Time = 9 WHERE Id = 102"), SQLITE_OK);
+    EXPECT_EQ(get_time(102), 9);
 }
 
 }  // namespace dlp::test
