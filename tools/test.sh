@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # The project's test command: installs what is missing, builds everything, checks the formatting,
-# Android.bp and a libc++ build's exports, and runs every test, then again under sanitizers, and the
-# fuzzers (tools/sanitizers.sh).
+# Android.bp and a libc++ build's exports, and runs every test on each Android ABI
+# (tools/test-abi.sh), then natively again under sanitizers, and the fuzzers (tools/sanitizers.sh).
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
@@ -15,7 +15,10 @@ tools/check-format.sh
 tools/check-android-bp.sh "$build"
 tools/check-libcxx-exports.sh "$build"
 
-(cd "$build" && ctest --output-on-failure -j "$(nproc)")
+# Every test on each Android ABI: x86_64 is the build above, the others are cross-built.
+for abi in x86_64 x86 arm64 armv7; do
+  DLP_BUILD_DIR=$build tools/test-abi.sh "$abi"
+done
 
 # Every hot-path benchmark once, briefly: it fails when a case no longer takes its road.
 DLP_BUILD_DIR=$build tools/benchmark.sh --quick >/dev/null
