@@ -44,7 +44,7 @@ if [[ $abi == x86_64 ]]; then
 else
   build=build-abi/$abi
   cmake --build "$native" -j "$(nproc)" --target zmk_dlp_stand_in
-  cmake -S . -B "$build" -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-$abi.cmake \
+  cmake -S . -B "$build" -DCMAKE_TOOLCHAIN_FILE="cmake/toolchain-$abi.cmake" \
     -DCMAKE_BUILD_TYPE=Release -DDLP_BUILD_TESTS=ON --no-warn-unused-cli \
     -DDLP_DEVICE_STAND_IN="$PWD/$native/tools/zmk_dlp_stand_in/zmk_dlp_stand_in" >/dev/null
   cmake --build "$build" -j "$(nproc)"
