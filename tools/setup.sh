@@ -21,19 +21,21 @@ for architecture in "${foreign_architectures[@]}"; do
   packages+=("${foreign_packages[@]/%/:$architecture}")
 done
 
-# Each package is queried for the architecture it is needed for (a package built for every
-# architecture is "all"): with a bare name dpkg prints one status per installed architecture.
+# dpkg prints one status per installed architecture of a package: each is checked for the
+# architecture it is needed for, the build machine's own unless named. A package built for every
+# architecture says "all".
 native_architecture=$(dpkg --print-architecture)
-queries=()
-for package in "${packages[@]}"; do
-  [[ $package == *:* ]] && queries+=("$package") || queries+=("$package:$native_architecture" "$package:all")
-done
-installed=$'\n'$(dpkg-query -W -f='${Package}:${Architecture} ${Status}\n' "${queries[@]}" 2>/dev/null || true)
+installed=$'\n'$(dpkg-query -W -f='${Package}:${Architecture} ${Status}\n' "${packages[@]%%:*}" \
+  2>/dev/null || true)
+is_installed() { [[ $installed == *$'\n'"$1 install ok installed"* ]]; }
 missing=()
 for package in "${packages[@]}"; do
-  [[ $package == *:* ]] || package+=:$native_architecture
-  [[ $installed == *$'\n'"$package install ok installed"* ||
-    $installed == *$'\n'"${package%:*}:all install ok installed"* ]] || missing+=("${package%:"$native_architecture"}")
+  if [[ $package == *:* ]]; then
+    is_installed "$package" || missing+=("$package")
+  else
+    is_installed "$package:$native_architecture" || is_installed "$package:all" ||
+      missing+=("$package")
+  fi
 done
 known_architectures=" $(dpkg --print-foreign-architectures | tr '\n' ' ') "
 new_architectures=()
