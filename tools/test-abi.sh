@@ -22,14 +22,16 @@ if [[ ${1:-} == --emulated ]]; then
 fi
 cd "$(dirname "$0")/.."
 
-# The ELF header's start and mask of each ABI's executables, as binfmt_misc reads them.
+# The start of each ABI's executables (ELF class, data, version, padding, type, machine) and the
+# mask binfmt_misc compares it under.
+readonly padding='\x00\x00\x00\x00\x00\x00\x00\x00\x00'
 readonly elf_mask='\xff\xff\xff\xff\xff\xff\xff\x00\xff\xff\xff\xff\xff\xff\xff\xff\xfe\xff\xff\xff'
 abi=${1:-}
 case $abi in
   x86_64) ;;
-  x86) emulator=i386 header='\x7fELF\x01\x01\x01\x00\x00\x00\x00\x00\x00\x00\x00\x00\x02\x00\x03\x00' ;;
-  arm64) emulator=aarch64 header='\x7fELF\x02\x01\x01\x00\x00\x00\x00\x00\x00\x00\x00\x00\x02\x00\xb7\x00' ;;
-  armv7) emulator=arm header='\x7fELF\x01\x01\x01\x00\x00\x00\x00\x00\x00\x00\x00\x00\x02\x00\x28\x00' ;;
+  x86) emulator=i386 header="\x7fELF\x01\x01\x01$padding\x02\x00\x03\x00" ;;
+  arm64) emulator=aarch64 header="\x7fELF\x02\x01\x01$padding\x02\x00\xb7\x00" ;;
+  armv7) emulator=arm header="\x7fELF\x01\x01\x01$padding\x02\x00\x28\x00" ;;
   *)
     echo "usage: $0 x86_64|x86|arm64|armv7" >&2
     exit 2
@@ -62,7 +64,8 @@ if [[ $abi != x86_64 ]] && ! "$build/tools/dlpctl/dlpctl" --help >/dev/null 2>&1
     ":dlp-$emulator:M::$header:$elf_mask:/usr/bin/$DLP_EMULATOR:PF")
 fi
 status=0
-(cd "$build" && GTEST_OUTPUT=json:$results/ "${runner[@]}" ctest --output-on-failure -j "$(nproc)") |
+(cd "$build" &&
+  GTEST_OUTPUT=json:$results/ "${runner[@]}" ctest --output-on-failure -j "$(nproc)") |
   tee "$results/ctest.log" || status=$?
 
 # Each test program's cases from its report; a test without one (a trace, a script, a program
