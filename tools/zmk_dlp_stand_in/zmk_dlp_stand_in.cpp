@@ -16,6 +16,7 @@
 
 #include <android-base/unique_fd.h>
 #include <fcntl.h>
+#include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -291,6 +292,12 @@ int main(int argc, char* argv[]) {
 
     // Single-threaded: requests are handled, and their state written, one at a time.
     int result = fuse_session_loop(session.get());
+    // The loop also ends when its mount goes; a stop asked for from then on must not kill a
+    // stand-in that is ending already, once its handlers are gone.
+    sigset_t stopSignals;
+    sigemptyset(&stopSignals);
+    for (int signal : {SIGHUP, SIGINT, SIGTERM}) sigaddset(&stopSignals, signal);
+    sigprocmask(SIG_BLOCK, &stopSignals, nullptr);
     fuse_session_unmount(session.get());
     fuse_remove_signal_handlers(session.get());
     // A positive result is the signal that asked the loop to stop.
