@@ -116,6 +116,11 @@ class WriteTransaction {
     bool begun_ = false;
 };
 
+// A copy of the connection's last error text, which its next call replaces.
+SqliteText lastError(sqlite3* database) {
+    return SqliteText(sqlite3_mprintf("%s", sqlite3_errmsg(database)));
+}
+
 // sqlite3_step's outcome for a look-up: a row, no row, or a failure whose text it hands back.
 enum class LookUp { kRow, kNoRow, kFailed };
 
@@ -123,7 +128,7 @@ LookUp step(sqlite3* database, sqlite3_stmt* statement, SqliteText& error) {
     int result = sqlite3_step(statement);
     if (result == SQLITE_ROW) return LookUp::kRow;
     if (result == SQLITE_DONE) return LookUp::kNoRow;
-    error.reset(sqlite3_mprintf("%s", sqlite3_errmsg(database)));
+    error = lastError(database);
     return LookUp::kFailed;
 }
 
@@ -209,7 +214,7 @@ int setTimeLocked(int id, int time) {
     Statement select = selectDuration(database.get(), id);
     // A look-up that fails must not pass for a missing row: that would add a second row for the id.
     if (!select) {
-        error.reset(sqlite3_mprintf("%s", sqlite3_errmsg(database.get())));
+        error = lastError(database.get());
         return failed();
     }
     LookUp found = step(database.get(), select.get(), error);

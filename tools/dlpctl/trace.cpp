@@ -14,6 +14,7 @@
 #include <cstring>
 #include <filesystem>
 #include <optional>
+#include <string_view>
 
 #include "app_processes.h"
 #include "command_vector.h"
@@ -106,13 +107,14 @@ int64_t expiry(const std::string& text) {
 }
 
 // A trace comes from elsewhere: it may name files under the working directory and /data alone.
-void checkPath(const std::string& path, std::string workingDirectory) {
+// `workingDirectory` ends in "/".
+void checkPath(const std::string& path, const std::string& workingDirectory) {
     if (("/" + path + "/").find("/../") != std::string::npos) {
         throw MalformedLine{"path '" + path + "' has a '..' component"};
     }
     if (path[0] != '/') return;
-    if (workingDirectory.back() != '/') workingDirectory += '/';
-    for (const std::string& allowed : {workingDirectory, std::string("/data/")}) {
+    for (std::string_view allowed :
+         {std::string_view(workingDirectory), std::string_view("/data/")}) {
         if (path.compare(0, allowed.size(), allowed) == 0) return;
     }
     throw MalformedLine{"path '" + path + "' lies outside the working directory and /data"};
@@ -220,7 +222,7 @@ class TracePlayer {
             mkdirat(directory.get(), name.c_str(), 0777);
             directory.reset(openat(directory.get(), name.c_str(),
                                    O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
-            if (!directory.ok()) break;
+            if (!directory.ok()) throw FailedLine{"cannot create " + path + ": " + strerror(errno)};
         }
         std::string name = start == std::string::npos ? "" : path.substr(start);
         android::base::unique_fd created(
@@ -274,6 +276,7 @@ int replayTrace(std::istream& input, const std::string& traceName, bool echoComm
     // that is refused has written nothing.
     std::vector<TraceLine> parsedLines;
     std::string workingDirectory = std::filesystem::current_path().string();
+    if (workingDirectory.back() != '/') workingDirectory += '/';
     for (size_t index = 0; index < lines.size(); ++index) {
         try {
             const std::vector<Word>& words =
